@@ -28,6 +28,8 @@ int Run(int camera, const std::string& codec, std::size_t frame_bytes, int frame
     control::CommonConfigKeeper common(installation);
     ring::StreamFormat format;
     format.codec = codec;
+    format.width = 1280;
+    format.height = 720;
     format.every_frame_is_key = codec == "MJPEG";
     ring::StreamEstimate estimate;
     estimate.every_frame_is_key = format.every_frame_is_key;

@@ -25,6 +25,7 @@ HOSTS = (1, 2, 4)
 CAMERAS, CAMERAS_A_HOST = 1000, 250
 EVENT_S, MARK_S = 300, 600
 SETTLE_S, SECONDS = 10.0, 30.0
+FILL_S = 10.0  # a ring of 16 MiB, whose pages cost more when they are written to for the first time
 ROUNDS, RESUME_S = 5, 10.0  # whoever stood still has stored what it missed before the questions
 DATABASE = "hosts"
 
@@ -166,7 +167,8 @@ def print_rows(bin_folder):
 
 @contextlib.contextmanager
 def two_hosts(bin_folder, server):
-    """The stand whose camera 1 sends pictures, one that has nothing but the store, and a cookie for both."""
+    """The stand whose camera 1 sends pictures, one that has nothing but the store and a recorder, which gets them from
+    there, and a cookie for both."""
     store = server.new_database("live")
     with contextlib.ExitStack() as stack:
         stands = []
@@ -180,6 +182,7 @@ def two_hosts(bin_folder, server):
         stands[0].start_feeder(1, "MJPEG", 100_000, 25)
         for stand in stands:
             stand.start_host()
+        stands[1].start_recorder("--host-offline-limit", "600")  # the feeder has no heartbeat
         yield *stands, stands[0].log_in()
 
 
@@ -201,13 +204,16 @@ def print_live(bin_folder):
     print("|---|---|---|---|---|---|---|")
     with Postgres() as server, two_hosts(bin_folder, server) as (owner, other, cookie):
         def serving():
-            return [pid for stand in (owner, other) for name in ("webapi", "nginx") for pid in stand.processes(name)]
+            return [pid for stand, names in ((owner, ("webapi", "nginx")), (other, ("webapi", "nginx", "recorder")))
+                    for name in names for pid in stand.processes(name)]
         for count in load.viewers:
             direct = None
             for name, stand in (("the host that has it", owner), ("another host", other)):
                 target = ["--port", str(stand.tls_port), "--streams", "32", "--cookie", cookie, "--query", QUERY]
-                row = measure(lambda *arguments: viewers(bin_folder, *arguments, target, "bench_browser_viewers"),
-                              load, count, serving)
+                def watch(count, seconds):
+                    return viewers(bin_folder, count, seconds, target, "bench_browser_viewers")
+                watch(1, FILL_S)()
+                row = measure(watch, load, count, serving)
                 direct = direct or row["behind_micros"]
                 print(f"| {count} | {name} | {row['behind_micros']:.0f} | {row['behind_micros'] / direct:.2f} "
                       f"| {row['p50_ms']:.1f} | {row['p99_ms']:.1f} | {row['delivered']:.0%} |", flush=True)

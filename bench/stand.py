@@ -109,8 +109,8 @@ class Stand(Installation):
         process.terminate()
         process.wait(timeout=20)
 
-    def start_recorder(self):
-        self._start("recorder", self._bin / "lookhaven-recorder", "--home", self.home)
+    def start_recorder(self, *options):
+        self._start("recorder", self._bin / "lookhaven-recorder", "--home", self.home, *options)
 
     def start_feeder(self, camera, codec, frame_bytes, frames_per_second):
         self._start(

@@ -24,7 +24,6 @@ namespace lookhaven::api {
 namespace {
 
 constexpr const char* kTokenHeader = "HTTP_X_LOOKHAVEN_FORWARDED";
-constexpr std::string_view kTokenLine = "X-Lookhaven-Forwarded: ";
 constexpr std::chrono::seconds kMaxSilentLive{60};
 // Small, since pictures that wait in it grow old where the viewer cannot keep up.
 constexpr int kLiveReceiveBytes = 64 << 10;
@@ -53,9 +52,8 @@ remote::ForwardedRequest RequestOf(const Call& call, const store::Host& host, Fo
     remote::ForwardedRequest request;
     request.query = "api=" + call.api + "&version=" + std::to_string(call.version) + "&method=" + call.method;
     const std::string key = store::Sessions(call.Records()).Key();
-    request.headers.push_back(std::string(kTokenLine) + remote::MakeForwardToken(key, host.id,
-                                                                                 call.request.Header("REMOTE_ADDR"),
-                                                                                 base::WallSeconds()));
+    request.headers.push_back(
+        remote::ForwardTokenLine(key, host.id, call.request.Header("REMOTE_ADDR"), base::WallSeconds()));
     request.headers.push_back("Cookie: " + CookiesOf(call));
     const std::string_view tag = call.request.Header("HTTP_IF_NONE_MATCH");
     if (!tag.empty() && tag.size() <= kMaxTagBytes && IsPrintable(tag)) {

@@ -10,11 +10,13 @@
 #include <vector>
 
 #include "platform/admission/pairauth.h"
+#include "platform/camera/camera.h"
 #include "standalone/api/footage.h"
 #include "standalone/api/footage_place.h"
 #include "standalone/api/forward.h"
 #include "standalone/api/own_apis.h"
 #include "standalone/api/player.h"
+#include "standalone/binding/live_ring.h"
 #include "standalone/binding/rights.h"
 #include "standalone/maintenance/host_status.h"
 #include "standalone/store/hosts.h"
@@ -25,6 +27,8 @@ namespace {
 
 // How long hosts are asked for a player, one after another; the last may take three seconds more.
 constexpr std::chrono::seconds kMaxSearch{9};
+// For the recorder to have it; then that host is asked for this viewer alone.
+constexpr std::chrono::seconds kMaxWaitForStream{3};
 constexpr const char* kLiveApi = "VEXO.Lookhaven.Player.LiveviewSrc";
 
 // 0 for what is no number; the handler says what is wrong with it.
@@ -52,12 +56,34 @@ int HostOfCamera(store::Store& records, int camera_id) {
     return camera ? camera->host_id : recording;
 }
 
+// Whether this host's recorder gets the stream from the other one, so that the module finds it here: once for all who
+// watch it here, when there is a second. Nobody waits for that whose host is known to be offline.
+bool ComesHere(const Call& call, int camera_id, int host) {
+    if (call.api != kLiveApi || IdOf(call, "snapshot") == 1 || call.is_forwarded) {
+        return false;
+    }
+    call.slot.other_hosts_camera = camera_id;
+    if (!call.slots.IsWatchedByOthers(call.slot, camera_id) ||
+        maintenance::OfflineHosts(call.context.Installation()).contains(host)) {
+        return false;
+    }
+    Camera camera;
+    if (camera.Load(camera_id, 0, 0) != 0) {
+        return false;
+    }
+    const auto asked = static_cast<CAM_PROFILE_TYPE>(call.NumberOr("profileType", CAM_PROFILE_DEFAULT));
+    const int stream = camera.GetUiStreamNo(asked == CAM_PROFILE_DEFAULT ? camera.GetLiveProfile() : asked);
+    call.context.CloseRecords();
+    return binding::AwaitLiveRing({camera_id, stream}, kMaxWaitForStream);
+}
+
 Place PlaceOfLive(const Call& call, int own_host) {
     const int camera = IdOf(call, "camera");
     const int host = camera > 0 ? HostOfCamera(call.Records(), camera) : 0;
     const bool is_for_caller =
         host != 0 && host != own_host && IsAdmitted(call) && binding::MayUse(camera, store::CameraAccess::kLive);
-    return {is_for_caller ? host : 0, Forwarded::kLive, "camera " + std::to_string(camera)};
+    const bool is_elsewhere = is_for_caller && !ComesHere(call, camera, host);
+    return {is_elsewhere ? host : 0, Forwarded::kLive, "camera " + std::to_string(camera)};
 }
 
 // The event that a player of the module plays, by the names that its methods have for it.

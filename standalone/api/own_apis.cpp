@@ -16,9 +16,10 @@ const Method& OwnApi::Find(int version, const std::string& method) const {
 }
 
 const OwnApi* FindOwnApi(const std::string& name) {
-    static constexpr std::array kApis = {
-        &kAuthApi,    &kCameraApi,  &kCatalogApi,  &kDeviceApi, &kEmapApi,   &kEventApi,  &kGroupApi, &kMountApi,
-        &kPairingApi, &kPictureApi, &kPlaybackApi, &kRelayApi,  &kServerApi, &kSystemApi, &kTokenApi, &kUserApi};
+    static constexpr std::array kApis = {&kAuthApi,    &kCameraApi,   &kCatalogApi, &kDeviceApi, &kEmapApi,
+                                         &kEventApi,   &kGroupApi,    &kHostApi,    &kMountApi,  &kPairingApi,
+                                         &kPictureApi, &kPlaybackApi, &kRelayApi,   &kServerApi, &kSystemApi,
+                                         &kTokenApi,   &kUserApi};
     const auto* const found =
         std::find_if(kApis.begin(), kApis.end(), [&name](const OwnApi* each) { return name == each->name; });
     return found == kApis.end() ? nullptr : *found;

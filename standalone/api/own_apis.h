@@ -40,6 +40,7 @@ extern const OwnApi kDeviceApi;    // doors, I/O modules and POS terminals as a 
 extern const OwnApi kEmapApi;      // e-maps, what their editor needs, and the states of doors and ports
 extern const OwnApi kEventApi;     // report what happened at a camera, list it, stream and download its footage
 extern const OwnApi kGroupApi;     // camera groups as a manager sets them up
+extern const OwnApi kHostApi;      // what only another host of the same store may ask
 extern const OwnApi kMountApi;     // storage mounts: how full, for how long, and their limits
 extern const OwnApi kPairingApi;   // what a paired host may ask, and one that pairs by a code
 extern const OwnApi kPictureApi;   // one JPEG of a camera, whatever codec it sends

@@ -3,6 +3,7 @@
 // Live streams: who may attach a ring, how long attaching waits, and the ring's calls under the platform's names.
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <csignal>
 #include <cstddef>
 #include <optional>
@@ -13,6 +14,7 @@
 #include "platform/admission/host.h"
 #include "platform/live/livestream.h"
 #include "standalone/base/clock.h"
+#include "standalone/binding/live_ring.h"
 #include "standalone/binding/request_context.h"
 #include "standalone/binding/rights.h"
 #include "standalone/binding/slow_viewer.h"
@@ -49,7 +51,7 @@ namespace {
 ring::SecondReader g_sound;
 bool g_is_silent = false;  // none will ever come
 
-constexpr std::int64_t kMaxAttachMicros = 5'000'000;
+constexpr std::chrono::seconds kMaxAttach{5};
 constexpr long kAttachPollNanos = 10'000'000;
 
 ring::Position* Inner(__tag_DATA_ENTRY_INFO* position) {
@@ -82,12 +84,14 @@ bool HasStream(store::Store& records, int camera_id, int stream) {
 }
 
 // Waits for a ring with a frame of this start; null when none comes in time, the recorder dies or a signal arrives.
-void* AttachRunning(const RequestContext& context, const ring::StreamId& id) {
-    control::Demand demand(context.Installation());
+void* AttachRunning(const base::Installation& installation, control::LiveStream wanted,
+                    std::chrono::microseconds limit) {
+    control::Demand demand(installation);
+    const ring::StreamId id{wanted.camera, wanted.stream, base::Medium::kVideo};
     void* stream = nullptr;
     for (const std::int64_t start = MonotonicMicros();;) {
         if (stream == nullptr) {
-            stream = ring::Attach(context.Installation(), id);
+            stream = ring::Attach(installation, id);
         }
         if (stream != nullptr && !ring::IsRetired(stream) && ring::HasFrameOfThisStart(stream)) {
             return stream;
@@ -96,9 +100,9 @@ void* AttachRunning(const RequestContext& context, const ring::StreamId& id) {
             ring::Detach(stream);
             stream = nullptr;
         }
-        demand.Request(*context.GrantedStream());
+        demand.Request(wanted);
         const timespec pause{0, kAttachPollNanos};
-        if (MonotonicMicros() - start > kMaxAttachMicros || !IsLHRunning() || ::nanosleep(&pause, nullptr) != 0) {
+        if (MonotonicMicros() - start > limit.count() || !IsLHRunning() || ::nanosleep(&pause, nullptr) != 0) {
             break;
         }
     }
@@ -108,7 +112,34 @@ void* AttachRunning(const RequestContext& context, const ring::StreamId& id) {
     return nullptr;
 }
 
+void* AttachGranted(RequestContext& context, control::LiveStream stream, bool may_hear) {
+    context.GrantStream(stream, may_hear);
+    context.CloseRecords();
+    return AttachRunning(context.Installation(), stream, kMaxAttach);
+}
+
 }  // namespace
+
+namespace lookhaven::binding {
+
+ShmStreamFifo* AttachLiveRing(control::LiveStream stream) {
+    RequestContext& context = RequestContext::Current();
+    if (!IsLHRunning() || !HasStream(context.Records(), stream.camera, stream.stream)) {
+        return nullptr;
+    }
+    return static_cast<ShmStreamFifo*>(AttachGranted(context, stream, true));
+}
+
+bool AwaitLiveRing(control::LiveStream stream, std::chrono::microseconds limit) {
+    void* const found =
+        IsLHRunning() ? AttachRunning(RequestContext::Current().Installation(), stream, limit) : nullptr;
+    if (found != nullptr) {
+        ring::Detach(found);
+    }
+    return found != nullptr;
+}
+
+}  // namespace lookhaven::binding
 
 ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
     RequestContext& context = RequestContext::Current();
@@ -121,9 +152,7 @@ ShmStreamFifo* LiveStreamFifoAt(int camId, int streamNo) {
         if (!IsLHRunning() || !HasStream(context.Records(), camId, streamNo)) {
             return nullptr;
         }
-        context.GrantStream({camId, streamNo}, MayUse(camId, store::CameraAccess::kAudio));
-        context.CloseRecords();
-        return AttachRunning(context, {camId, streamNo, base::Medium::kVideo});
+        return AttachGranted(context, {camId, streamNo}, MayUse(camId, store::CameraAccess::kAudio));
     });
     return static_cast<ShmStreamFifo*>(stream);
 }

@@ -82,6 +82,7 @@ Slot* SlotTable::Take(std::size_t keep_free) {
     slot->player.paused = false;
     slot->player.pause = PackPause(++last_serial_, {});
     slot->forwarded_player_key = 0;
+    slot->other_hosts_camera = 0;
     slot->serial = last_serial_;
     return slot;
 }

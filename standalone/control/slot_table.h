@@ -94,6 +94,7 @@ struct alignas(kSlotBytes) Slot {
     Player player;
     std::atomic<std::int64_t> forwarded_player_key;  // of the player whose stream it forwards; 0: none
     std::atomic<int> player_host_id;                 // the host where that player runs
+    std::atomic<int> other_hosts_camera;             // that its client watches; 0: none
 
     bool MustEnd() const { return ended == serial; }
 };
@@ -168,6 +169,8 @@ class SlotTable {
     // of the session's newest such player with this key; 0 if none.
     static void NoteForwardedPlayer(Slot& slot, std::int64_t key, int host);
     int FindForwardedPlayer(std::string_view session, std::int64_t key) const;
+    // Whether another request's client watches that camera, which another host has.
+    bool IsWatchedByOthers(const Slot& slot, int camera) const;
     // Held by requests while they change more than one thing of a player, whose rate is in its progress file and whose
     // pause is in its slot. Null after a second.
     SharedLock LockPlayers() const;

@@ -58,6 +58,15 @@ bool CameraLeaseKeeper::IsHeldElsewhere(int camera) const {
     return !held_elsewhere_ || held_elsewhere_->contains(camera);
 }
 
+std::optional<int> CameraLeaseKeeper::OtherHolder(int camera) const {
+    const std::lock_guard lock(mutex_);
+    if (!held_elsewhere_) {
+        return std::nullopt;
+    }
+    const auto found = held_elsewhere_->find(camera);
+    return found == held_elsewhere_->end() ? 0 : found->second;
+}
+
 void CameraLeaseKeeper::NoteRecorded(std::set<int> cameras) {
     const std::lock_guard lock(mutex_);
     recorded_ = std::move(cameras);
@@ -156,10 +165,10 @@ std::map<int, std::int64_t> CameraLeaseKeeper::ChangedRates(const std::vector<st
 }
 
 void CameraLeaseKeeper::NoteHolders(const std::vector<store::CameraLease>& cameras) {
-    std::set<int> elsewhere;
+    std::map<int, int> elsewhere;
     for (const store::CameraLease& camera : cameras) {
         if (camera.host_id != 0 && camera.host_id != own_) {
-            elsewhere.insert(camera.camera_id);
+            elsewhere.emplace(camera.camera_id, camera.host_id);
         }
     }
     const std::lock_guard lock(mutex_);

@@ -43,6 +43,8 @@ class CameraLeaseKeeper {
     std::set<int> Held() const;
     // Another host has its lease, online or offline; also while that is not known yet.
     bool IsHeldElsewhere(int camera) const;
+    // That host's id; 0 where no other has the lease; nothing while that is not known yet.
+    std::optional<int> OtherHolder(int camera) const;
     // Call once the last Held() was acted upon: the cameras that are still being recorded or written.
     void NoteRecorded(std::set<int> cameras);
     // As in StoreThread.
@@ -72,9 +74,9 @@ class CameraLeaseKeeper {
     mutable std::mutex mutex_;
     CameraRates rates_;
     std::set<int> held_;
-    std::optional<std::set<int>> held_elsewhere_;
-    std::int64_t published_ = 0;     // times that held_ changed
-    mutable std::int64_t seen_ = 0;  // published_ when Held was called last
+    std::optional<std::map<int, int>> held_elsewhere_;  // by camera, the host
+    std::int64_t published_ = 0;                        // times that held_ changed
+    mutable std::int64_t seen_ = 0;                     // published_ when Held was called last
     std::set<int> recorded_;
     std::int64_t noted_ = -1;  // the published_ that recorded_ belongs to
     StoreThread thread_;       // last: it uses the others

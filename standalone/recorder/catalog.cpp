@@ -5,6 +5,8 @@
 
 #include "standalone/base/log.h"
 #include "standalone/store/cameras.h"
+#include "standalone/store/hosts.h"
+#include "standalone/store/sessions.h"
 #include "standalone/store/settings.h"
 
 namespace lookhaven::recorder {
@@ -35,6 +37,24 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
         }
     }
     return result;
+}
+
+std::map<int, OtherHost> OtherHosts(store::Store& store, int own) {
+    std::map<int, OtherHost> others;
+    store::Hosts hosts(store);
+    const std::optional<store::Host> self = own == 0 ? std::nullopt : hosts.Find(own);
+    if (!self) {
+        return others;
+    }
+    const std::string key = store::Sessions(store).Key();
+    for (const store::Host& host : hosts.All()) {
+        if (host.id != own) {
+            others.emplace(
+                host.id,
+                OtherHost{host.id, host.name, {host.address, host.port, host.certificate}, key, self->address});
+        }
+    }
+    return others;
 }
 
 }  // namespace
@@ -98,6 +118,7 @@ void Catalog::Read(store::Store& store) {
         plan.installation = installation;
         contents->cameras.emplace(camera.id, std::move(plan));
     }
+    contents->hosts = OtherHosts(store, host_);
     for (const store::Mount& mount : mounts.List()) {
         if (mount.IsOf(host_)) {
             contents->mounts.emplace(mount.id, mount.enabled);

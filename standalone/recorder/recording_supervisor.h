@@ -8,6 +8,7 @@
 #include <atomic>
 #include <map>
 #include <memory>
+#include <optional>
 #include <set>
 #include <string>
 #include <vector>
@@ -44,6 +45,11 @@ class RecordingSupervisor {
     void AddCounters(control::StreamCounters& counters) const;
     // Where to push the stream's frames; null when it is not recorded.
     std::shared_ptr<FrameQueue> QueueOf(control::LiveStream stream) const;
+
+    // The other host that has the camera's lease; 0 where none has; nothing while that is not known yet.
+    std::optional<int> OtherHolder(int camera) const {
+        return camera_leases_ ? camera_leases_->OtherHolder(camera) : 0;
+    }
 
     // Asks all threads to end. Rows are stored after the last event is closed, so poll HasEnded until it is true.
     void RequestStop();

@@ -65,6 +65,12 @@ void StreamRings::EndRun() {
     }
 }
 
+void StreamRings::Close() {
+    video_format_.reset();
+    video_.reset();
+    audio_.reset();
+}
+
 void StreamRings::Beat() {
     for (std::optional<Ring>* ring : {&video_, &audio_}) {
         if (*ring) {

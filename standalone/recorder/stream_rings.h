@@ -32,6 +32,9 @@ class StreamRings {
     // The source failed: viewers find none of its frames any more, and wait for the next run.
     void EndRun();
 
+    // Retires the rings: viewers' streams end. The next packet makes new ones.
+    void Close();
+
     // Heartbeat: the writer is alive although no frame comes. Call once a second meanwhile.
     void Beat();
 

@@ -98,8 +98,8 @@ void StreamSupervisor::Reconcile() {
     needed.insert(needed.end(), recorded.begin(), recorded.end());
     std::map<control::LiveStream, StreamPlan> plans;
     for (const control::LiveStream& stream : needed) {
-        if (const auto plan = catalog->streams.find(stream); plan != catalog->streams.end()) {
-            plans.insert(*plan);
+        if (std::optional<StreamPlan> plan = PlanOf(*catalog, stream)) {
+            plans.emplace(stream, *std::move(plan));
         } else {
             catalog_.Refresh();  // added a moment ago, perhaps
         }
@@ -119,14 +119,30 @@ void StreamSupervisor::Reconcile() {
             Start(stream, plan);
         }
         if (const auto worker = workers_.find(stream); worker != workers_.end()) {
-            worker->second->SetRecording(recordings_.QueueOf(stream));
+            worker->second->SetRecording(worker->second->Plan().other_host ? nullptr : recordings_.QueueOf(stream));
         }
     }
+}
+
+std::optional<StreamPlan> StreamSupervisor::PlanOf(const CatalogContents& catalog, control::LiveStream stream) const {
+    const auto plan = catalog.streams.find(stream);
+    const std::optional<int> holder = recordings_.OtherHolder(stream.camera);
+    if (plan == catalog.streams.end() || !holder) {
+        return std::nullopt;
+    }
+    StreamPlan result = plan->second;
+    if (const auto host = catalog.hosts.find(*holder); host != catalog.hosts.end()) {
+        result.other_host = host->second;
+    }
+    return result;
 }
 
 std::map<int, CameraSignal> StreamSupervisor::Signals() const {
     std::map<int, CameraSignal> signals;
     for (const auto& [stream, worker] : workers_) {
+        if (worker->Plan().other_host) {
+            continue;  // that host says how its camera is
+        }
         const CameraSignal signal{worker->Plan().camera_name, recordings_.QueueOf(stream) != nullptr, worker->Signal(),
                                   worker->Counts().bytes};
         const auto [known, is_first] = signals.try_emplace(stream.camera, signal);

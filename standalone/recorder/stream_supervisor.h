@@ -10,6 +10,7 @@
 #include <chrono>
 #include <map>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "standalone/base/installation.h"
@@ -43,6 +44,8 @@ class StreamSupervisor {
     void DoEverySecond();
     void Reconcile();
     void DropEndedWorkers();
+    // Where to get the stream from; nothing for one that does not exist, or of whose camera that is not known yet.
+    std::optional<StreamPlan> PlanOf(const CatalogContents& catalog, control::LiveStream stream) const;
     std::map<int, CameraSignal> Signals() const;
     void PublishCounters();
     void CorrectVideoTypes();

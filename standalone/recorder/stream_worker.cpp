@@ -73,7 +73,8 @@ void StreamWorker::Run(const std::stop_token& stop) {
             } catch (const std::exception& failure) {
                 if (!stop.stop_requested()) {
                     ReportFailure(failure);
-                    rings.EndRun();
+                    // Whoever watches another host's camera learns from the web API what is wrong with that host.
+                    plan_.other_host ? rings.Close() : rings.EndRun();
                     WaitToTryAgain(rings, stop);
                 }
             }
@@ -81,6 +82,11 @@ void StreamWorker::Run(const std::stop_token& stop) {
     }
     base::LogInfo(Title(stream_, plan_) + "stopped");
     has_ended_ = true;
+}
+
+std::unique_ptr<media::Source> StreamWorker::Open(const std::stop_token& stop) const {
+    return plan_.other_host ? OpenHostStream(*plan_.other_host, stream_, options_, stop)
+                            : media::OpenSource(kinds_, plan_.url, options_, stop);
 }
 
 // Leaves by an exception only.
@@ -91,7 +97,7 @@ void StreamWorker::Stream(StreamRings& rings, const std::stop_token& stop) {
         const std::lock_guard lock(mutex_);
         ++counts_.connections;
     }
-    const std::unique_ptr<media::Source> source = media::OpenSource(kinds_, plan_.url, options_, stop);
+    const std::unique_ptr<media::Source> source = Open(stop);
     for (;;) {
         const media::Packet packet = source->Next();
         // Recording first: it does not depend on what the live view needs.

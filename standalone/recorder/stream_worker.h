@@ -19,6 +19,7 @@
 #include "standalone/media/source.h"
 #include "standalone/recorder/backoff.h"
 #include "standalone/recorder/frame_queue.h"
+#include "standalone/recorder/host_stream.h"
 #include "standalone/recorder/stream_rings.h"
 
 namespace lookhaven::recorder {
@@ -28,11 +29,13 @@ struct StreamPlan {
     std::string camera_name;
     std::string url;
     media::Credentials credentials;
-    bool insecure = false;  // as in media::SourceOptions
+    bool insecure = false;                     // as in media::SourceOptions
+    std::optional<OtherHost> other_host = {};  // which has the camera, and is asked in its place
 
     // Whether a running stream can go on: renaming a camera does not interrupt it.
     bool HasSourceOf(const StreamPlan& other) const {
-        return url == other.url && credentials == other.credentials && insecure == other.insecure;
+        return other_host == other.other_host &&
+               (other_host || (url == other.url && credentials == other.credentials && insecure == other.insecure));
     }
 };
 
@@ -74,6 +77,7 @@ class StreamWorker {
     void Run(const std::stop_token& stop);
     void Stream(StreamRings& rings, const std::stop_token& stop);
     void WriteRings(StreamRings& rings, const media::Packet& packet, const std::optional<media::StreamFormat>& audio);
+    std::unique_ptr<media::Source> Open(const std::stop_token& stop) const;
     void WaitToTryAgain(StreamRings& rings, const std::stop_token& stop);
     void ReportLive(const media::StreamFormat& video, const std::optional<media::StreamFormat>& audio);
     void ReportFailure(const std::exception& failure);

@@ -19,6 +19,8 @@ struct Host {
     std::string address;  // a name or a number
     int port = 0;
     std::string certificate;  // PEM, what its web server must show
+
+    bool operator==(const Host&) const = default;
 };
 
 struct Request {

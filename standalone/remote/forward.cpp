@@ -43,7 +43,7 @@ std::string PathOf(std::string_view location) {
     return is_path && IsPlain(location) ? std::string(location) : "";
 }
 
-class ForwardedTransfer {
+class ForwardedTransfer : public Forwarding {
   public:
     ForwardedTransfer(const Host& host, const ForwardedRequest& request, AnswerSink& sink)
         : sink_(sink),
@@ -67,10 +67,36 @@ class ForwardedTransfer {
         handle_.Set(CURLOPT_NOPROGRESS, 0L);
         handle_.Set(CURLOPT_XFERINFOFUNCTION, &ForwardedTransfer::OnProgress);
         handle_.Set(CURLOPT_XFERINFODATA, this);
+        if (multi_ == nullptr || ::curl_multi_add_handle(multi_.get(), handle_.Get()) != CURLM_OK) {
+            throw std::bad_alloc();
+        }
+    }
+    ~ForwardedTransfer() override { ::curl_multi_remove_handle(multi_.get(), handle_.Get()); }
+    ForwardedTransfer(const ForwardedTransfer&) = delete;
+    ForwardedTransfer& operator=(const ForwardedTransfer&) = delete;
+
+    bool Step(std::chrono::milliseconds limit) override {
+        has_come_ = false;
+        int running = 0;
+        if (::curl_multi_perform(multi_.get(), &running) != CURLM_OK) {
+            throw NoAnswer("the connection cannot be made");
+        }
+        if (running == 0) {
+            int left = 0;
+            const CURLMsg* const message = ::curl_multi_info_read(multi_.get(), &left);
+            End(message == nullptr ? CURLE_RECV_ERROR : message->data.result);
+            return false;
+        }
+        if (!has_come_) {
+            ::curl_multi_poll(multi_.get(), nullptr, 0, static_cast<int>(limit.count()), nullptr);
+        }
+        return true;
     }
 
-    bool Run() {
-        const CURLcode result = handle_.Perform();
+    bool IsComplete() const override { return is_complete_; }
+
+  private:
+    void End(CURLcode result) {
         if (result == CURLE_OK && !has_begun_) {
             if (!has_whole_head_) {
                 throw NoAnswer("it broke off its answer");
@@ -88,10 +114,9 @@ class ForwardedTransfer {
                 handle_.ThrowNoAnswer(result);
             }
         }
-        return result == CURLE_OK && !is_ended_by_sink_;
+        is_complete_ = result == CURLE_OK && !is_ended_by_sink_;
     }
 
-  private:
     static std::vector<std::string> LinesOf(const ForwardedRequest& request) {
         std::vector<std::string> lines = request.headers;
         lines.insert(lines.end(), {"Content-Type: application/json", "Expect:"});
@@ -129,6 +154,7 @@ class ForwardedTransfer {
     }
 
     bool Take(std::span<const char> bytes) {
+        has_come_ = true;
         if (!has_begun_) {
             Begin();
         }
@@ -178,14 +204,18 @@ class ForwardedTransfer {
     bool has_whole_head_ = false;
     bool has_begun_ = false;
     bool is_ended_by_sink_ = false;
+    bool is_complete_ = false;
+    bool has_come_ = false;  // a part of the body, in this step
     PinnedHandle handle_;
+    const std::unique_ptr<CURLM, decltype(&::curl_multi_cleanup)> multi_{::curl_multi_init(), &::curl_multi_cleanup};
 };
 
 }  // namespace
 
 }  // namespace lookhaven::remote
 
-bool LookhavenForward(const lookhaven::remote::Host& host, const lookhaven::remote::ForwardedRequest& request,
-                      lookhaven::remote::AnswerSink& sink) {
-    return lookhaven::remote::ForwardedTransfer(host, request, sink).Run();
+lookhaven::remote::Forwarding* LookhavenBeginForward(const lookhaven::remote::Host& host,
+                                                     const lookhaven::remote::ForwardedRequest& request,
+                                                     lookhaven::remote::AnswerSink& sink) {
+    return new lookhaven::remote::ForwardedTransfer(host, request, sink);
 }

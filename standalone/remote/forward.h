@@ -9,6 +9,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <memory>
 #include <span>
 #include <string>
 #include <utility>
@@ -51,6 +52,28 @@ class AnswerSink {
     virtual bool WantsMore() = 0;
 };
 
+// A request on its way, and its answer: what comes is given to the sink in the thread that asks for it.
+class Forwarding {
+  public:
+    virtual ~Forwarding() = default;
+
+    // Gives the sink what has come; where that is nothing, waits for something, at most so long. False when the answer
+    // has ended, or the sink has ended it: then only ask IsComplete. Throws as Forward.
+    virtual bool Step(std::chrono::milliseconds limit) = 0;
+    virtual bool IsComplete() const = 0;
+};
+
+// Steps until the answer has ended, or the sink has ended it: whether it is complete. Throws as Forward.
+inline bool Finish(Forwarding& forwarding) {
+    while (forwarding.Step(std::chrono::seconds(1))) {
+    }
+    return forwarding.IsComplete();
+}
+
+// Nothing is sent before the first Step, within a second of which the next must follow. Borrows the sink. Throws
+// InvalidCertificate; and std::runtime_error when the library cannot be loaded.
+std::unique_ptr<Forwarding> BeginForward(const Host& host, const ForwardedRequest& request, AnswerSink& sink);
+
 // Returns when the answer has ended, or the sink has ended it: whether it is complete. Throws NoAnswer when none
 // began, after three seconds where there is no such host and after max_head_wait where it says nothing;
 // WrongCertificate; InvalidCertificate; and std::runtime_error when the library cannot be loaded.
@@ -59,6 +82,6 @@ bool Forward(const Host& host, const ForwardedRequest& request, AnswerSink& sink
 }  // namespace lookhaven::remote
 
 // What the shared library gives to forward_loader.cpp, which alone calls it.
-extern "C" __attribute__((visibility("default"))) bool
-LookhavenForward(const lookhaven::remote::Host& host, const lookhaven::remote::ForwardedRequest& request,
-                 lookhaven::remote::AnswerSink& sink);
+extern "C" __attribute__((visibility("default"))) lookhaven::remote::Forwarding*
+LookhavenBeginForward(const lookhaven::remote::Host& host, const lookhaven::remote::ForwardedRequest& request,
+                      lookhaven::remote::AnswerSink& sink);

@@ -4,8 +4,13 @@
 
 namespace lookhaven::remote {
 
+std::unique_ptr<Forwarding> BeginForward(const Host& host, const ForwardedRequest& request, AnswerSink& sink) {
+    const auto begin = reinterpret_cast<decltype(&LookhavenBeginForward)>(FindInLibrary("LookhavenBeginForward"));
+    return std::unique_ptr<Forwarding>(begin(host, request, sink));
+}
+
 bool Forward(const Host& host, const ForwardedRequest& request, AnswerSink& sink) {
-    return reinterpret_cast<decltype(&LookhavenForward)>(FindInLibrary("LookhavenForward"))(host, request, sink);
+    return Finish(*BeginForward(host, request, sink));
 }
 
 }  // namespace lookhaven::remote

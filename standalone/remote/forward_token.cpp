@@ -32,6 +32,10 @@ std::string MakeForwardToken(std::string_view key, int to_host, std::string_view
     return said.append(CodeOf(key, to_host, said));
 }
 
+std::string ForwardTokenLine(std::string_view key, int to_host, std::string_view client, std::int64_t now_s) {
+    return "X-Lookhaven-Forwarded: " + MakeForwardToken(key, to_host, client, now_s);
+}
+
 std::optional<std::string> ClientInForwardToken(std::string_view token, std::string_view key, int own_host,
                                                 std::int64_t now_s) {
     if (token.size() > kMaxTokenBytes || token.size() <= kTokenCodeDigits || !IsTokenKey(key)) {

@@ -30,6 +30,7 @@ class PinnedHandle {
             throw std::runtime_error("libcurl lacks an option that this program needs");
         }
     }
+    CURL* Get() const { return handle_.get(); }
     CURLcode Perform() { return ::curl_easy_perform(handle_.get()); }
 
     // What is known of the answer so far.

@@ -46,7 +46,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     request.max_head_wait = std::chrono::seconds(5);
     Client client;
     try {
-        LookhavenForward({"127.0.0.1", 1, ""}, request, client);
+        remote::Finish(
+            *std::unique_ptr<remote::Forwarding>(LookhavenBeginForward({"127.0.0.1", 1, ""}, request, client)));
         fuzz::Require(client.has_begun);
     } catch (const remote::NoAnswer&) {
         fuzz::Require(!client.has_begun);

@@ -71,6 +71,7 @@ Event.Download event={event}                                          E      E  
 Event.Stream event={event} timestamp=5                                E      E     S/N     N     D/N  S/N     S/N      S/N      S/N    S/N     E
 Event.PlanExport cameralists={camera} from=-1d to=now                 E      E     D/N     N     D/N  D/N     D/N      N        D/N    D/N     E
 Event.Export cameralists={camera} from=-1d to=now                     E      E     D/N     N     D/N  D/N     D/N      N        D/N    D/N     E
+POST Host.Live camera=1 stream=0                                      F      F     F       F     F    F       F        F        F      F       F
 Pairing.Cameras                                                       E      E     E       E     E    E       E        E        E      E       D
 Pairing.Accept                                                        M      M     M       M     M    M       M        M        M      M       M
 Picture.Get camera={camera}                                           E      E     D/N     N     D/N  D/N     D/N      D/N      D/N    D/N     E

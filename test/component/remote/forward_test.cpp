@@ -34,7 +34,7 @@ class Client : public AnswerSink {
 bool Ask(std::string_view answer, Client& client) {
     test::answer = answer;
     ForwardedRequest request{.query = "api=a", .headers = {"Cookie: __Host-id=c"}, .json = "{}"};
-    return LookhavenForward({"127.0.0.1", 1, ""}, request, client);
+    return Finish(*std::unique_ptr<Forwarding>(LookhavenBeginForward({"127.0.0.1", 1, ""}, request, client)));
 }
 
 TEST(Forward, PassesOnWhatSaysWhatTheBodyIsAndNothingElse) {
