@@ -54,7 +54,7 @@ std::string NameOfHost(store::Store& records, int id) {
 
 }  // namespace
 
-Place PlaceOfFootage(const Call& call, const std::optional<Footage>& footage, int own_host) {
+ForwardTarget TargetOfFootage(const Call& call, const std::optional<Footage>& footage, int own_host) {
     const auto access = call.method == "Download" ? store::CameraAccess::kExport : store::CameraAccess::kPlayback;
     if (!footage || !binding::MayUse(footage->camera_id, access)) {
         return {};
@@ -77,7 +77,7 @@ Place PlaceOfFootage(const Call& call, const std::optional<Footage>& footage, in
     return {Choose(call, hosts, own_host), Forwarded::kFootage, what};
 }
 
-Place PlaceOfExport(const Call& call, int own_host) {
+ForwardTarget TargetOfExport(const Call& call, int own_host) {
     std::optional<std::set<int>> with_all;
     std::set<int> owners;
     std::string shared;  // names

@@ -77,7 +77,7 @@ bool ComesHere(const Call& call, int camera_id, int host) {
     return binding::AwaitLiveRing({camera_id, stream}, kMaxWaitForStream);
 }
 
-Place PlaceOfLive(const Call& call, int own_host) {
+ForwardTarget TargetOfLive(const Call& call, int own_host) {
     const int camera = IdOf(call, "camera");
     const int host = camera > 0 ? HostOfCamera(call.Records(), camera) : 0;
     const bool is_for_caller =
@@ -106,18 +106,18 @@ std::optional<Footage> FootageOf(const Call& call) {
                    : FindFootage(call.Records(), KindOf(call), call.Parameter("event").asInt());
 }
 
-Place PlaceOf(const Call& call, int own_host) {
+ForwardTarget TargetOf(const Call& call, int own_host) {
     const bool is_event = call.api == kEventApi.name;
     if (IsLive(call)) {
-        return PlaceOfLive(call, own_host);
+        return TargetOfLive(call, own_host);
     }
     if (is_event && (call.method == "Export" || call.method == "PlanExport")) {
-        return PlaceOfExport(call, own_host);
+        return TargetOfExport(call, own_host);
     }
     const bool needs_footage =
         IsPlayer(call) || (call.api == kPictureApi.name && call.method == "At") ||
         (is_event && (call.method == "Frame" || call.method == "Download" || call.method == "Stream"));
-    return needs_footage ? PlaceOfFootage(call, FootageOf(call), own_host) : Place();
+    return needs_footage ? TargetOfFootage(call, FootageOf(call), own_host) : ForwardTarget();
 }
 
 // The hosts that may have a player that does not run here: the one whose stream of it this host forwards, else all
@@ -179,21 +179,21 @@ bool ForwardIfNeeded(const Call& call) {
     if (steers_player) {
         return ForwardControl(call, own_host);
     }
-    const Place place = PlaceOf(call, own_host);
-    if (place.host_id == 0 || place.host_id == own_host) {
+    const ForwardTarget target = TargetOf(call, own_host);
+    if (target.host_id == 0 || target.host_id == own_host) {
         return false;
     }
-    const auto host = store::Hosts(call.Records()).Find(place.host_id);
+    const auto host = store::Hosts(call.Records()).Find(target.host_id);
     if (!host) {
-        throw Failure(503, place.what + " is on a host that was removed from this installation");
+        throw Failure(503, target.what + " is on a host that was removed from this installation");
     }
     if (call.is_forwarded) {
-        throw Failure(503, place.what + " has moved to host " + host->name + "; try again", http::kRetrySoonSeconds);
+        throw Failure(503, target.what + " has moved to host " + host->name + "; try again", http::kRetrySoonSeconds);
     }
     if (IsPlayer(call) || (call.api == kEventApi.name && call.method == "Stream")) {
         control::SlotTable::NoteForwardedPlayer(call.slot, call.NumberOr("timestamp", 0), host->id);
     }
-    Forward(call, *host, place.kind, place.what);
+    Forward(call, *host, target.kind, target.what);
     return true;
 }
 

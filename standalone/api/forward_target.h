@@ -7,9 +7,19 @@
 //               files are one host's alone.
 #pragma once
 
+#include <string>
+
 #include "standalone/api/call.h"
+#include "standalone/api/forward.h"
 
 namespace lookhaven::api {
+
+// The host that a call needs, for what it has alone.
+struct ForwardTarget {
+    int host_id = 0;  // 0: any
+    Forwarded kind = Forwarded::kFootage;
+    std::string what;  // that the host has, for an error message: as in Forward
+};
 
 // False where this host answers the call itself, also where the caller may not have what it asks for: the refusal is
 // the same everywhere. True when another host has answered it on standard output. Only for an admitted call. Throws
