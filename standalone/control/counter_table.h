@@ -11,6 +11,7 @@
 #include <algorithm>
 #include <array>
 #include <atomic>
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <exception>
@@ -65,7 +66,8 @@ class CounterTable {
 };
 
 // The counting process's side of a Table, which is a CounterTable. A process whose table cannot be made says so once
-// and works without it, and each Write tries again.
+// and works without it. Write tries again, after a second at first and once a minute in the end: it waits for the disk
+// then.
 template <class Table>
 class CounterTableWriter {
   public:
@@ -74,7 +76,7 @@ class CounterTableWriter {
 
     template <class Counters>
     void Write(const std::vector<Counters>& all) {
-        if (!table_) {
+        if (!table_ && std::chrono::steady_clock::now() >= next_attempt_) {
             Replace();
         }
         if (table_) {
@@ -86,21 +88,27 @@ class CounterTableWriter {
     void Replace() {
         try {
             table_.emplace(MappedTable<Table>::Replace(path_, [](Table& table) { table.Begin(); }));
+            if (pause_.count() > 0) {
+                base::LogInfo("the table of counts " + path_.string() + " works again");
+            }
         } catch (const std::exception& failure) {
             std::error_code ignored;
             std::filesystem::remove(path_, ignored);  // an earlier process's numbers are not this one's
-            if (!std::exchange(has_failed_, true)) {
+            if (pause_.count() == 0) {
                 base::LogError(
                     std::string(
                         "cannot create a table of counts, which is tried again; monitoring lacks them until then: ") +
                     failure.what());
             }
+            pause_ = std::clamp<std::chrono::seconds>(2 * pause_, std::chrono::seconds(1), std::chrono::seconds(60));
+            next_attempt_ = std::chrono::steady_clock::now() + pause_;
         }
     }
 
     const std::filesystem::path path_;
     std::optional<MappedTable<Table>> table_;
-    bool has_failed_ = false;
+    std::chrono::seconds pause_{0};  // after the last failure; 0: there was none
+    std::chrono::steady_clock::time_point next_attempt_;
 };
 
 }  // namespace lookhaven::control

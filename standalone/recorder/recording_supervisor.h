@@ -2,7 +2,8 @@
 //
 // Starts and stops the recording of every camera.
 //
-// Thread safety One thread; no call waits for a disk or the store.
+// Thread safety One thread. No call waits for the store, nor for a disk, except to make a table of counts that could
+//               not be made before (control/counter_table.h).
 #pragma once
 
 #include <atomic>
