@@ -19,13 +19,6 @@ namespace lookhaven::api {
 
 namespace {
 
-// As the recorder of this machine sees it.
-bool IsOnline(const std::vector<maintenance::HostStatus>& states, int host) {
-    return std::ranges::any_of(states, [host](const maintenance::HostStatus& status) {
-        return status.host == host && status.state != maintenance::HostState::kOffline;
-    });
-}
-
 // The hosts that can read the mount; 0 for the only machine.
 std::set<int> HostsWith(store::Store& records, const store::Mount& mount, int own_host) {
     if (!mount.IsShared()) {
@@ -34,7 +27,7 @@ std::set<int> HostsWith(store::Store& records, const store::Mount& mount, int ow
     const std::vector<int> known = store::SharedMounts(records).HostsWith(mount.id);
     std::set<int> hosts(known.begin(), known.end());
     hosts.erase(own_host);
-    if (maintenance::IsHere(records, mount)) {
+    if (maintenance::IsMountedHere(records, mount)) {
         hosts.insert(own_host);
     }
     return hosts;
@@ -42,9 +35,9 @@ std::set<int> HostsWith(store::Store& records, const store::Mount& mount, int ow
 
 // Of several hosts this one, else the first that is online, else the first.
 int Choose(const Call& call, const std::set<int>& hosts, int own_host) {
-    const auto states = maintenance::ReadHostStatus(call.context.Installation());
-    const auto online = std::ranges::find_if(hosts, [&](int host) { return IsOnline(states, host); });
-    return hosts.contains(own_host) ? own_host : online != hosts.end() ? *online : *hosts.begin();
+    const std::set<int> online = maintenance::OnlineHosts(call.context.Installation());
+    const auto first = std::ranges::find_if(hosts, [&](int host) { return online.contains(host); });
+    return hosts.contains(own_host) ? own_host : first != hosts.end() ? *first : *hosts.begin();
 }
 
 std::string NameOfHost(store::Store& records, int id) {
@@ -71,7 +64,7 @@ ForwardTarget TargetOfFootage(const Call& call, const std::optional<Footage>& fo
     // What grows is flushed, and known to grow, by the host that records it.
     const bool is_recorded_elsewhere =
         footage->grows && footage->host_id != own_host && hosts.contains(footage->host_id);
-    if (is_recorded_elsewhere && IsOnline(maintenance::ReadHostStatus(call.context.Installation()), footage->host_id)) {
+    if (is_recorded_elsewhere && maintenance::OnlineHosts(call.context.Installation()).contains(footage->host_id)) {
         return {footage->host_id, Forwarded::kFootage, what};
     }
     return {Choose(call, hosts, own_host), Forwarded::kFootage, what};

@@ -101,7 +101,7 @@ void CheckMounts(const base::Installation& installation, store::Store& records, 
                 }
             }
             // A host may do without a shared mount that others have.
-            if (problem && maintenance::IsOnlyElsewhere(installation, records, mount)) {
+            if (problem && maintenance::IsOnlyOnOtherHosts(installation, records, mount)) {
                 problem.reset();
             }
         } catch (const std::system_error& error) {

@@ -95,7 +95,7 @@ Condition ConditionOf(store::Store& records, const store::Mount& mount, const Mo
         const auto host = store::Hosts(records).Find(mount.host_id);
         return {"other-host", host ? "it is of host " + host->name : "it is of a host that was removed"};
     }
-    if (maintenance::IsOnlyElsewhere(known.installation, records, mount)) {
+    if (maintenance::IsOnlyOnOtherHosts(known.installation, records, mount)) {
         return {"elsewhere", "not mounted on this host: what is on it comes from the others"};
     }
     Condition condition;

@@ -41,7 +41,7 @@ std::vector<MountFigures> LookAtMounts(const base::Installation& installation, s
     std::vector<MountFigures> mounts;
     for (const store::Mount& mount : store::Mounts(records).List()) {
         // A host may do without a shared mount that others have.
-        if (!mount.IsOf(installation.HostId()) || maintenance::IsOnlyElsewhere(installation, records, mount)) {
+        if (!mount.IsOf(installation.HostId()) || maintenance::IsOnlyOnOtherHosts(installation, records, mount)) {
             continue;
         }
         MountFigures& figures = mounts.emplace_back();

@@ -82,7 +82,7 @@ bool IsReadable(const store::Mount& mount) {
 }
 
 Findings CheckEnabled(const base::Installation& installation, store::Store& store, const store::Mount& mount) {
-    if (maintenance::IsOnlyElsewhere(installation, store, mount)) {
+    if (maintenance::IsOnlyOnOtherHosts(installation, store, mount)) {
         return {
             {Concat(TitleOf(mount), ", which hosts share, is not mounted here: this host records elsewhere, and plays"
                                     " what is on it through the others"),

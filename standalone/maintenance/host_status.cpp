@@ -19,6 +19,16 @@ std::filesystem::path PathOf(const base::Installation& installation) {
     return installation.RunFolder() / "hosts";
 }
 
+std::set<int> HostsThatAre(const base::Installation& installation, bool offline) {
+    std::set<int> hosts;
+    for (const HostStatus& each : ReadHostStatus(installation)) {
+        if ((each.state == HostState::kOffline) == offline) {
+            hosts.insert(each.host);
+        }
+    }
+    return hosts;
+}
+
 }  // namespace
 
 const char* NameOf(HostState state) {
@@ -51,13 +61,11 @@ std::vector<HostStatus> ReadHostStatus(const base::Installation& installation) {
 }
 
 std::set<int> OfflineHosts(const base::Installation& installation) {
-    std::set<int> offline;
-    for (const HostStatus& each : ReadHostStatus(installation)) {
-        if (each.state == HostState::kOffline) {
-            offline.insert(each.host);
-        }
-    }
-    return offline;
+    return HostsThatAre(installation, true);
+}
+
+std::set<int> OnlineHosts(const base::Installation& installation) {
+    return HostsThatAre(installation, false);
 }
 
 }  // namespace lookhaven::maintenance

@@ -38,7 +38,9 @@ void WriteHostStatus(const base::Installation& installation, const std::vector<H
 // As ReadCameraStatus: a recorder that has ended leaves its last report behind.
 std::vector<HostStatus> ReadHostStatus(const base::Installation& installation);
 
-// The ids of those that are offline, of the same report.
+// The ids of those that the same report calls offline, and of all others in it. A host that it does not name is in
+// neither: nobody has watched its heartbeat yet, so nothing may rely on it.
 std::set<int> OfflineHosts(const base::Installation& installation);
+std::set<int> OnlineHosts(const base::Installation& installation);
 
 }  // namespace lookhaven::maintenance

@@ -4,7 +4,6 @@
 #include <algorithm>
 #include <set>
 #include <system_error>
-#include <vector>
 
 #include "standalone/maintenance/host_status.h"
 #include "standalone/maintenance/mount_folder.h"
@@ -12,26 +11,32 @@
 
 namespace lookhaven::maintenance {
 
-bool IsHere(store::Store& store, const store::Mount& mount) {
+namespace {
+
+enum class Folder { kMounted, kAbsent, kFailing };
+
+Folder Find(store::Store& store, const store::Mount& mount) {
     try {
-        return OpenMount(store, mount).has_value();
+        return OpenMount(store, mount) ? Folder::kMounted : Folder::kAbsent;
     } catch (const std::system_error&) {
-        return false;
+        return Folder::kFailing;
     }
 }
 
-bool IsOnlyElsewhere(const base::Installation& installation, store::Store& store, const store::Mount& mount) {
-    try {
-        if (!mount.IsShared() || OpenMount(store, mount)) {
-            return false;
-        }
-    } catch (const std::system_error&) {
+}  // namespace
+
+bool IsMountedHere(store::Store& store, const store::Mount& mount) {
+    return Find(store, mount) == Folder::kMounted;
+}
+
+bool IsOnlyOnOtherHosts(const base::Installation& installation, store::Store& store, const store::Mount& mount) {
+    if (!mount.IsShared() || Find(store, mount) != Folder::kAbsent) {
         return false;
     }
     const int own_host = installation.HostId();
-    const std::set<int> offline = OfflineHosts(installation);
+    const std::set<int> online = OnlineHosts(installation);
     return std::ranges::any_of(store::SharedMounts(store).HostsWith(mount.id),
-                               [&](int host) { return host != own_host && !offline.contains(host); });
+                               [&](int host) { return host != own_host && online.contains(host); });
 }
 
 }  // namespace lookhaven::maintenance

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Where the folder of a shared mount (store/shared_mounts.h) is: on this host, or on others that can be asked.
+// Where a shared mount (store/shared_mounts.h) can be read now: on this host, or only on others.
 #pragma once
 
 #include "standalone/base/installation.h"
@@ -10,10 +10,11 @@
 namespace lookhaven::maintenance {
 
 // Whether the mount's folder can be opened on this host. Throws store::StoreError.
-bool IsHere(store::Store& store, const store::Mount& mount);
+bool IsMountedHere(store::Store& store, const store::Mount& mount);
 
-// Whether the mount is shared, and absent here, but on another host that is online as the recorder of this one sees it.
-// False where its folder fails here, which is this host's trouble. Throws store::StoreError, std::system_error.
-bool IsOnlyElsewhere(const base::Installation& installation, store::Store& store, const store::Mount& mount);
+// Whether the mount is shared, and not mounted here, but on another host that the recorder of this one reports as
+// online. False where its folder fails to open for another reason than that it is absent: that is trouble of this
+// host. Throws store::StoreError, std::system_error.
+bool IsOnlyOnOtherHosts(const base::Installation& installation, store::Store& store, const store::Mount& mount);
 
 }  // namespace lookhaven::maintenance
