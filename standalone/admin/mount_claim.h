@@ -26,11 +26,12 @@ class UnusableFolder : public std::runtime_error {
 std::string RequireFolder(const std::string& path);
 
 // Throws UnusableFolder for a folder that is another mount's, of this installation or of another one, which would lose
-// its footage; not with take_over. mount_id: 0 for a new mount.
+// its footage; not with take_over. mount_id: 0 for a new mount. Throws std::system_error where the folder's marker
+// cannot be read, and store::StoreError.
 void RequireFreeFolder(store::Store& store, const std::string& path, int mount_id, bool take_over);
 
-// Throws UnusableFolder for a folder that is not marked as the shared mount that other hosts have: its disk may not be
-// mounted there.
+// Throws UnusableFolder for a folder that is not marked as the shared mount, while other hosts have that: its disk may
+// not be mounted here. Throws as RequireFreeFolder otherwise.
 void RequireSharedFolder(store::Store& store, const store::Mount& mount, int own_host);
 
 // Marks the folder as that of the mount. Throws std::system_error.

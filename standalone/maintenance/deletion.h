@@ -29,9 +29,9 @@ struct DeletionResult {
 
 class Deletion {
   public:
-    // host: this machine's, which maintains the mount if that is shared. All must outlive this object.
-    Deletion(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s,
-             int host = 0)
+    // host: this machine's, which must hold the lease of a shared mount; of no effect for any other mount. All must
+    // outlive this object.
+    Deletion(store::Store& store, const store::Mount& mount, const MountFolder& folder, std::int64_t now_s, int host)
         : store_(store),
           mount_(mount),
           folder_(folder),
@@ -49,7 +49,8 @@ class Deletion {
     // Finishes what is pending deletion: by Delete, or since a crash. Throws as Delete.
     void Finish();
 
-    const DeletionResult& Result() const { return result_; }  // of all calls
+    // Of all calls, also those that threw. What Finish is yet to finish is not in it.
+    const DeletionResult& Result() const { return result_; }
 
   private:
     // On a shared mount, while this host maintains it.

@@ -31,6 +31,8 @@ struct MountSpace {
 
     // What recording leaves free: a fiftieth of the disk, 2 MiB … 512 MiB.
     std::int64_t ReserveBytes() const;
+    // Whether retention makes room: less than twice that is free.
+    bool IsShort() const { return free_bytes < 2 * ReserveBytes(); }
     // The same of files, 10,000 at most.
     std::int64_t ReserveFiles() const;
 };

@@ -86,7 +86,7 @@ class Retention {
           now_s_(clock.now_s),
           applies_age_(clock.age_limit == AgeLimit::kApplies) {}
 
-    DeletionResult Run(DiskWatch& watch) {
+    void Run(DiskWatch& watch) {
         deletion_.Finish();
         if (applies_age_) {
             DeleteExpiredOfCameras();
@@ -117,8 +117,9 @@ class Retention {
         if (failure_) {
             std::rethrow_exception(failure_);
         }
-        return deletion_.Result();
     }
+
+    const DeletionResult& Deleted() const { return deletion_.Result(); }
 
   private:
     struct Room {  // as in SpaceWatch
@@ -164,7 +165,7 @@ class Retention {
 
     // How much must be deleted until the disk has its reserve free again.
     static std::int64_t LackingBytes(const MountSpace& space) {
-        return space.free_bytes < 2 * space.ReserveBytes() ? 3 * space.ReserveBytes() - space.free_bytes : 0;
+        return space.IsShort() ? 3 * space.ReserveBytes() - space.free_bytes : 0;
     }
 
     // Tiny files, as of a camera whose format changes all the time, fill a file system before their bytes do.
@@ -234,10 +235,20 @@ RetentionForecast ForecastRetention(store::Store& store, int camera_id, std::int
     return forecast;
 }
 
-DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
-                                DiskWatch& watch, int host) {
+void EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock, int host,
+                      DiskWatch& watch, DeletionResult& deleted) {
     const std::optional<MountFolder> folder = OpenMount(store, mount);
-    return folder ? Retention(store, mount, *folder, clock, host).Run(watch) : DeletionResult{};
+    if (!folder) {
+        return;
+    }
+    Retention retention(store, mount, *folder, clock, host);
+    try {
+        retention.Run(watch);
+    } catch (...) {
+        deleted = retention.Deleted();
+        throw;
+    }
+    deleted = retention.Deleted();
 }
 
 }  // namespace lookhaven::maintenance

@@ -38,13 +38,13 @@ struct DiskWatch {
 // Deletes events, the oldest first: those older than the mount's age limit, and as many as exceed its size limit or as
 // are needed to have three times the disk's reserve free once less than twice the reserve is; for the latter no more
 // than the watch allows. Before them, those older than their camera's maximum age. An event is kept while one recorded
-// before it, to the mount or for a camera's age by the camera, is not old enough. The result is empty for a mount that
-// is not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says nothing about
-// others: handle each mount by itself, and try again later. The events deleted until then stay deleted. A file of
-// which only the file system's rights or kinds are in the way keeps neither other cameras' ages nor the mount's limits
-// from being enforced; a disk that fails ends the run. host: as of Deletion, which throws store::LeaseLost.
-DeletionResult EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock,
-                                DiskWatch& watch, int host = 0);
+// before it, to the mount or for a camera's age by the camera, is not old enough. Nothing happens to a mount that is
+// not mounted. Throws store::StoreError; std::system_error for trouble with this mount, which says nothing about
+// others: handle each mount by itself, and try again later. A file of which only the file system's rights or kinds are
+// in the way keeps neither other cameras' ages nor the mount's limits from being enforced; a disk that fails ends the
+// run. host: as of Deletion, which throws store::LeaseLost. deleted: gets what was deleted, also by a run that throws.
+void EnforceRetention(store::Store& store, const store::Mount& mount, const RetentionClock& clock, int host,
+                      DiskWatch& watch, DeletionResult& deleted);
 
 // What the mount's own limits would have EnforceRetention delete over time, without what a full disk adds.
 struct RetentionForecast {

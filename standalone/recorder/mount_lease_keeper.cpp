@@ -33,7 +33,7 @@ void MountLeaseKeeper::GiveUp(store::Store& store) {
     store::SharedMounts(store).Release(mount_id_, host_);  // also one that an earlier recorder has left
 }
 
-bool MountLeaseKeeper::TakeChange() {
+bool MountLeaseKeeper::ConsumeChange() {
     return std::exchange(has_changed_, false);
 }
 

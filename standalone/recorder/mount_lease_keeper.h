@@ -26,17 +26,19 @@ class MountLeaseKeeper {
     // Call every second while the folder is mounted here. Renews the lease, or takes it where that may be taken. Throws
     // store::StoreError.
     void Update(store::Store& store, std::int64_t now_us);
-    // The folder fails here. Throws store::StoreError.
+    // Call when the folder fails here: releases the lease, so that another host can maintain the mount. Throws
+    // store::StoreError.
     void GiveUp(store::Store& store);
-    // The store says that another host has it now, or nobody.
+    // Call when the store has refused a change, or has ended the lease: from then on IsHeld is false. The store is not
+    // asked.
     void NoteLost();
 
     // As of the last of these calls.
     bool IsHeld() const { return is_held_; }
-    // Whether the lease was gained, or the set of hosts changed, since the last call: what others have left may be this
-    // host's to recover now. A change of hosts is told late by offline_us, so that one that was removed while it
-    // recorded has noticed.
-    bool TakeChange();
+    // Whether since the last call this host has gained the lease, or hosts were added or removed: the recordings that
+    // others have left unfinished may be this host's to recover now. True for a change of hosts once offline_us have
+    // passed, within which a removed host has noticed that it must not record any more.
+    bool ConsumeChange();
 
   private:
     bool Take(store::Store& store, std::int64_t now_us);

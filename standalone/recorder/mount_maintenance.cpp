@@ -25,12 +25,6 @@ constexpr std::int64_t kMinPauseUs = 5'000'000;
 constexpr std::int64_t kMaxPauseUs = 600'000'000;
 constexpr std::int64_t kMaxClockDifferenceS = 300;
 
-// Whether retention deletes for lack of space.
-bool IsShort(const maintenance::MountFolder& folder) {
-    const maintenance::MountSpace space = folder.Space();
-    return space.free_bytes < 2 * space.ReserveBytes();
-}
-
 }  // namespace
 
 MountMaintenance::MountMaintenance(int mount_id, MaintenanceContext context, bool is_space_held)
@@ -103,7 +97,7 @@ bool MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     if (!folder) {
         SetStatus(MountState::kNotMounted, failure.empty() ? mount.path : failure);
         must_recover_ = true;  // whatever is mounted later
-        // What failed for a moment may have rows to come.
+        // A folder that fails may be well again in a moment, and then has footage of this host whose rows are to come.
         is_recovered_ = mount.IsShared() && (is_recovered_ || failure.empty());
         lease_.NoteLost();
         lock_.Release();
@@ -119,11 +113,12 @@ bool MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     const int space_requests = context_.space_requests;
     const bool is_maintained_elsewhere = mount.IsShared() && !lease_.IsHeld();
     if (is_maintained_elsewhere) {
-        // Whether space comes back is the maintaining host's to see. One that takes over begins with one recording.
+        // The maintaining host sees whether deleting makes room. A host that takes over deletes one recording first.
         disk_watch_ = {maintenance::SpaceWatch(true), maintenance::SpaceWatch(true)};
         is_full_of_kept_ = false;
     } else if (now_us >= next_retention_us_ || std::exchange(seen_space_requests_, space_requests) != space_requests ||
-               (mount.IsShared() && !disk_watch_.bytes.IsPaused(now_us) && IsShort(*folder))) {  // for other hosts
+               // Other hosts' recordings fill a shared mount, too, and do not request space here.
+               (mount.IsShared() && !disk_watch_.bytes.IsPaused(now_us) && folder->Space().IsShort())) {
         next_retention_us_ = now_us + kRetentionUs;
         EnforceRetention(store, mount, clock);
         is_full_of_kept_ = mount.max_bytes > 0 && store::KeptEvents(store).SizeBytes(mount.id) >= mount.max_bytes;
@@ -140,7 +135,7 @@ bool MountMaintenance::Maintain(store::Store& store, const store::Mount& mount, 
     return true;
 }
 
-// A shared mount that cannot be opened here is not here: other hosts may have it.
+// A shared mount whose folder fails here counts as not mounted, since other hosts may have it; failure then says why.
 std::optional<maintenance::MountFolder> MountMaintenance::Open(store::Store& store, const store::Mount& mount,
                                                                std::string& failure) {
     try {
@@ -154,21 +149,21 @@ std::optional<maintenance::MountFolder> MountMaintenance::Open(store::Store& sto
     }
 }
 
-// By age, a host whose clock is wrong would delete what others have recorded today.
-bool MountMaintenance::AgreesWithStore(store::Store& store, const store::Mount& mount, const Clock& clock) {
+// A host whose clock is ahead would delete by age what other hosts have recorded to a shared mount today.
+bool MountMaintenance::IsClockInStep(store::Store& store, const store::Mount& mount, const Clock& clock) {
     if (!mount.IsShared()) {
         return true;
     }
-    const bool agrees = std::abs(store::SharedMounts(store).ServerTimeS() - clock.now_s) <= kMaxClockDifferenceS;
-    const bool has_changed = std::exchange(agrees_with_store_, agrees) != agrees;
-    if (has_changed && agrees) {
+    const bool in_step = std::abs(store::SharedMounts(store).ServerTimeS() - clock.now_s) <= kMaxClockDifferenceS;
+    const bool has_changed = std::exchange(is_clock_in_step_, in_step) != in_step;
+    if (has_changed && in_step) {
         base::LogInfo("mount " + std::to_string(mount.id) + ": maximum ages apply again");
     } else if (has_changed) {
         base::LogWarning("mount " + std::to_string(mount.id) +
                          ": maximum ages wait, because this host's clock is more"
                          " than five minutes off that of the store's server");
     }
-    return agrees;
+    return in_step;
 }
 
 void MountMaintenance::EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock) {
@@ -182,15 +177,13 @@ void MountMaintenance::EnforceRetention(store::Store& store, const store::Mount&
     };
     try {
         store::FootageRemovals(store).BeginDeletions();
-        deleted = maintenance::EnforceRetention(store, mount,
-                                                {clock.now_s,
-                                                 clock.is_trusted && AgreesWithStore(store, mount, clock)
-                                                     ? maintenance::AgeLimit::kApplies
-                                                     : maintenance::AgeLimit::kWaits,
-                                                 context_.monotonic_us()},
-                                                disk_watch_, context_.host);
+        const auto age_limit = clock.is_trusted && IsClockInStep(store, mount, clock) ? maintenance::AgeLimit::kApplies
+                                                                                      : maintenance::AgeLimit::kWaits;
+        maintenance::EnforceRetention(store, mount, {clock.now_s, age_limit, context_.monotonic_us()}, context_.host,
+                                      disk_watch_, deleted);
     } catch (const store::LeaseLost&) {
-        lease_.NoteLost();
+        count(0);  // that another host maintains the mount now is no failure
+        throw;
     } catch (...) {
         count(1);
         throw;
@@ -210,7 +203,7 @@ bool MountMaintenance::Acquire(store::Store& store, const store::Mount& mount) {
     }
     lock_.Release();
     lease_.Update(store, context_.monotonic_us());
-    must_recover_ |= lease_.TakeChange();
+    must_recover_ |= lease_.ConsumeChange();
     return true;
 }
 

@@ -79,7 +79,7 @@ class MountMaintenance {
     bool Maintain(store::Store& store, const store::Mount& mount, const Clock& clock);
     void EnforceRetention(store::Store& store, const store::Mount& mount, const Clock& clock);
     std::optional<maintenance::MountFolder> Open(store::Store& store, const store::Mount& mount, std::string& failure);
-    bool AgreesWithStore(store::Store& store, const store::Mount& mount, const Clock& clock);
+    bool IsClockInStep(store::Store& store, const store::Mount& mount, const Clock& clock);
     bool Acquire(store::Store& store, const store::Mount& mount);
     void Recover(store::Store& store, const store::Mount& mount, const Clock& clock);
     void SetStatus(maintenance::MountState state, const std::string& reason);
@@ -98,7 +98,7 @@ class MountMaintenance {
     Pause after_recovery_;
     std::int64_t next_retention_us_ = 0;
     bool is_full_of_kept_ = false;
-    bool agrees_with_store_ = true;
+    bool is_clock_in_step_ = true;
     int seen_space_requests_ = 0;
 
     std::atomic<bool> is_recovered_ = false;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Starts of threads that may fail and are retried: each failure costs what was to be started alone.
+// Starts threads: one that cannot be started is logged and can be tried again, and keeps no other from starting.
 #pragma once
 
 #include <exception>

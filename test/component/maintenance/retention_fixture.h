@@ -33,7 +33,9 @@ class RetentionTest : public testing::Test {
         store::Mount mount = *store::Mounts(footage_.Records()).Find(footage_.MountId());
         mount.max_bytes = max_bytes;
         mount.max_age_s = max_age_s;
-        return EnforceRetention(footage_.Records(), mount, {kNow, age_limit, now_us_}, watch_, host);
+        DeletionResult deleted;
+        EnforceRetention(footage_.Records(), mount, {kNow, age_limit, now_us_}, host, watch_, deleted);
+        return deleted;
     }
 
     void LimitAge(int camera, std::int64_t max_age_s) {
