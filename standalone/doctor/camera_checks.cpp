@@ -82,7 +82,8 @@ const char* RemedyOfPause(RecordingState state) {
     case RecordingState::kDiskFull:
         return "free space on its mount's disk, or lower the mount's limit with lookhaven mount set";
     case RecordingState::kDiskFails:
-        return "look for faults of its mount's disk in the kernel's messages (dmesg), and exchange it";
+        return "look for errors of its mount's disk in the kernel's messages (dmesg), and replace the disk if there "
+               "are any";
     default:
         return "check that its mount is enabled and in its place with lookhaven mount list";
     }

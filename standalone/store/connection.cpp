@@ -25,7 +25,7 @@ constexpr const char* kBriefTimeoutMs = "20";
 
 constexpr std::size_t kMaxNameBytes = 64;
 
-// SQLite itself says of most of what then fails that it is an I/O error.
+// Asked after a failure: SQLite reports most of those that a full disk causes as I/O errors.
 bool LiesOnFullDisk(const std::string& file) {
     std::error_code failure;
     return !file.empty() && std::filesystem::space(file, failure).available == 0 && !failure;
@@ -141,7 +141,7 @@ Connection::Transaction::Transaction(Connection& connection, Durability durabili
     session_ << (connection.IsSqlite() ? "begin immediate" : "begin");
     is_open_ = true;
     if (!connection.IsSqlite()) {
-        // A machine that stands still in between must not keep its locks until the server's TCP gives it up.
+        // A client that hangs inside its transaction, or whose machine does, loses its locks after that time.
         session_ << "set local idle_in_transaction_session_timeout = '20s'";
         if (is_lazy) {
             session_ << "set local synchronous_commit = off";

@@ -131,7 +131,7 @@ class Events {
     int NextIds(int count);
     // The same, and notes them as a block of the host's, which records the events.
     int ReserveIds(int count, int host);
-    // The last 4,096 of each host, also of those that were removed.
+    // The last 4,096 blocks of each host, also of removed hosts.
     std::vector<EventIdBlock> ReservedBlocks();
 
     // Stores the row under event.id, which came from NextId. Throws InvalidRecord, or AlreadyExists for a used id.

@@ -66,9 +66,10 @@ std::vector<Mark> OnSqlite(soci::session& sql, const MarkFilter& filter, std::in
                           kIdMask, expression, first, last, filter.begin_s, filter.limit, filter.offset);
 }
 
-// Patterns with spaces between, which any text that has these words fits. Only words of ASCII: whether others stay as
-// they are while a text is split depends on the server.
-std::string LettersOf(const TextQuery& words) {
+// A pattern for LIKE per word, with spaces between: a text that has the words matches all of them, and only such a text
+// need be split into words. None for words beyond ASCII: whether splitting leaves them as they are depends on the
+// server.
+std::string LikePatternsOf(const TextQuery& words) {
     std::string patterns;
     for (const TextQuery::Phrase& phrase : words.Phrases()) {
         if (std::ranges::any_of(phrase.typed, [](char c) { return static_cast<unsigned char>(c) >= 0x80; })) {
@@ -92,16 +93,18 @@ std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, std
     for (const TextQuery::Phrase& phrase : filter.words.Phrases()) {
         words += (words.empty() ? "'" : " & '") + phrase.typed + '\'';
     }
-    // The number stands for the truth value, which the planner would take to be rare.
-    return FetchAll<Mark>(sql,
-                          "where mark_words(text) @@ to_tsquery('simple', mark_small(:words))"
-                          " and cast(mark_small(text) like all (string_to_array(mark_small(:letters), ' ')) as integer)"
-                          " <> 0 and array[camera_id] && cast(:cameras as integer[])"
-                          " and camera_id = any (cast(:same_cameras as integer[])) and start_s >= :earliest"
-                          " and start_s < :end and end_s > :begin and :kind in (0, kind)" +
-                              OrderOf(filter, "start_s", "id"),
-                          words, LettersOf(filter.words), cameras, cameras, earliest_s, filter.end_s, filter.begin_s,
-                          filter.kind ? static_cast<int>(*filter.kind) : 0, filter.limit, filter.offset);
+    const std::string patterns = LikePatternsOf(filter.words);
+    // Without the cast to a number, the planner would assume that few rows match the patterns.
+    return FetchAll<Mark>(
+        sql,
+        "where mark_words(text) @@ to_tsquery('simple', mark_small(:words))"
+        " and cast(mark_small(text) like all (string_to_array(mark_small(:patterns), ' ')) as integer)"
+        " <> 0 and array[camera_id] && cast(:cameras as integer[])"
+        " and camera_id = any (cast(:same_cameras as integer[])) and start_s >= :earliest"
+        " and start_s < :end and end_s > :begin and :kind in (0, kind)" +
+            OrderOf(filter, "start_s", "id"),
+        words, patterns, cameras, cameras, earliest_s, filter.end_s, filter.begin_s,
+        filter.kind ? static_cast<int>(*filter.kind) : 0, filter.limit, filter.offset);
 }
 
 }  // namespace
