@@ -9,6 +9,9 @@ import type { Server } from "./server";
 export const kKinds = ["camera", "emap", "door", "io", "pos"] as const;
 export type ItemKind = (typeof kKinds)[number];
 
+/** The type of a port that is an output; 3 is an input, 0 what is no port. */
+export const kOutput = 1;
+
 /** What is placed on a map. Numbers are pixels of the picture and degrees clockwise from up. */
 export interface MapItem {
   kind: ItemKind;
@@ -32,7 +35,6 @@ export interface ViewerItem extends MapItem {
   /** The camera itself, or the one that watches the device; null where there is none. */
   camera: Pick<Camera, "id" | "server"> | null;
   videoType: number;
-  /** 3 an input, 1 an output, 0 neither. */
   portType: number;
 }
 

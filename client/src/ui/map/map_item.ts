@@ -2,7 +2,7 @@
 //
 // One item on a map: a button with its icon, its name beside it, and of a camera the direction it looks in.
 
-import type { ItemKind, MapItem, Placeable } from "../../wire/emaps";
+import { kOutput, type ItemKind, type MapItem, type Placeable } from "../../wire/emaps";
 import { element, setText } from "../widgets/dom";
 import { icon, type IconName } from "../widgets/icons";
 
@@ -38,17 +38,18 @@ export class MapItemView {
   readonly #icon = element("span", { class: "map-icon" });
   #state = "";
 
-  constructor(public item: MapItem) {
+  constructor(public item: MapItem & { portType?: number }) {
     // A camera's port is one of its contacts or relays, not a second camera.
-    const isCamera = item.kind === "camera" && item.port < 0;
+    const kind = item.kind === "camera" && item.port >= 0 ? "io" : item.kind;
     this.root = element(
       "button",
-      { type: "button", class: "map-item", "data-kind": isCamera || item.kind !== "camera" ? item.kind : "io" },
-      ...(isCamera ? [element("span", { class: "map-cone" })] : []),
+      { type: "button", class: "map-item", "data-kind": kind },
+      ...(kind === "camera" ? [element("span", { class: "map-cone" })] : []),
       this.#icon,
       this.#name,
     );
-    this.#icon.append(icon(isCamera || item.kind !== "camera" ? kIcons[item.kind] : "io"));
+    this.root.classList.toggle("is-output", item.portType === kOutput);
+    this.#icon.append(icon(kIcons[kind]));
     this.show(item);
   }
 

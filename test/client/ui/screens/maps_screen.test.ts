@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The maps' screen in a real browser: no way out of its editor loses changes unasked.
+// The maps' screen in a real browser: no way out of its editor loses changes unasked, and an output that is on is
+// no alarm.
 
 import { hasBrowser, isFirefox, ServedClient } from "../../support/served_client";
 
@@ -17,11 +18,15 @@ describe.skipIf(!hasBrowser)("in a browser", () => {
       Emaps: { emap: [{ id: 1, name: "Ground floor" }, { id: 2, name: "Upper floor" }] },
       Items: { ...map, name: "Ground floor", revision: 1 },
       Devices: { camera: [], emap: [], door: [], io: [], pos: [] },
-      States: { door: [], io: [] },
+      States: { door: [], io: [0, 1].map((portIdx) => ({ id: 7, hxId: 0, portIdx, state: "on", since: 1, camera: 0 })) },
     };
-    client.server.emap = { ...map, emap: "", emapType: "png" };
+    const ports = [3, 1].map((portType, portIdx) => ({ ...place, type: 3, id: 7, x: 40 + 40 * portIdx, portIdx, portType }));
+    client.server.emap = { ...map, items: [...map.items, ...ports], emap: "", emapType: "png" };
     const page = await client.open(`${client.address}#events`, 1440, 900);
     await page.evaluate(() => (location.hash = "#map=1"));
+    await page.waitForSelector("[data-kind=io][data-state=on]");
+    const colours = page.locator("[data-kind=io] .map-icon").evaluateAll((icons) => icons.map((one) => getComputedStyle(one).backgroundColor));
+    expect((await colours).map((one) => one === "rgb(240, 178, 78)"), "an output that is on is no alarm").toEqual([true, false]);
     await page.click(".map-item");
     await page.locator(".large").getByRole("button", { name: /^Last 30 seconds of / }).click();
     await page.waitForSelector(".stage-caption");
