@@ -6,9 +6,9 @@
 //               end.
 
 import { isSameFootage, type Footage } from "../wire/footage";
+import { isTemporary } from "../wire/outage";
 import type { Recordings } from "../wire/recordings";
 import { ServerError } from "../wire/server";
-import { isPassing } from "./failure_reason";
 import { readFrames, type RecordedFrame } from "./frame_stream";
 import { RecordedSound } from "./recorded_sound";
 import { kNotStreamed } from "./video_decoding";
@@ -73,7 +73,7 @@ export class FootageStream {
       try {
         return await readVideo(open, { from: index, rate }, keep, this.sound, signal);
       } catch (error) {
-        if (!(error instanceof ServerError) || isPassing(error)) throw error;
+        if (!(error instanceof ServerError) || isTemporary(error)) throw error;
         // Any other failure will be told by the pictures, too.
         if (error.status === kNotStreamed) this.#refused = footage;
         this.#isVideo = false;

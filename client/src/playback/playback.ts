@@ -6,9 +6,9 @@
 //               lost, another stream continues from the frame on the screen.
 
 import { delay } from "../wire/delay";
+import { isTemporary } from "../wire/outage";
 import { newStreamKey, type Recordings } from "../wire/recordings";
 import { asServerError, ServerError } from "../wire/server";
-import { isPassing } from "./failure_reason";
 import type { FootageStream } from "./footage_stream";
 import { kMaxSilenceMs, type RecordedFrame } from "./frame_stream";
 import type { OpenFootage } from "./open_footage";
@@ -85,7 +85,7 @@ export class Playback {
     } catch (error) {
       const failure = asServerError(error);
       // A stream that has shown a picture can be opened again.
-      if (!shown.hasBegun || !isPassing(failure)) throw failure;
+      if (!shown.hasBegun || !isTemporary(failure)) throw failure;
       return this.#isOver(from, performance.now() - begunMs) ? "ended" : "lost";
     } finally {
       this.#isStreaming = false;

@@ -9,9 +9,10 @@
 import type { AudioPlayer } from "../live/audio_player";
 import { delay } from "../wire/delay";
 import { isSameFootage, type Footage } from "../wire/footage";
+import { isAway } from "../wire/outage";
 import type { Recordings } from "../wire/recordings";
 import { asServerError } from "../wire/server";
-import { isAway, reasonOf } from "./failure_reason";
+import { reasonOf } from "./failure_reason";
 import { FootageStream } from "./footage_stream";
 import type { RecordedFrame } from "./frame_stream";
 import { OpenFootage } from "./open_footage";

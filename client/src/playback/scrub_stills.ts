@@ -71,10 +71,12 @@ export class ScrubStills {
   }
 
   #pump(): void {
-    while (this.#wanted.length > 0 && this.#running.size < kMaxConcurrent) void this.#fetch(this.#wanted.shift()!);
+    while (this.#wanted.length > 0 && this.#running.size < kMaxConcurrent) {
+      void this.#fetch(this.#wanted.shift()!, (this.#asked += 1));
+    }
   }
 
-  async #fetch(request: ScrubRequest, number = (this.#asked += 1)): Promise<void> {
+  async #fetch(request: ScrubRequest, number: number): Promise<void> {
     const { camera, footage, atMs, widthPx } = request;
     const signal = this.#end.signal;
     if (!footage) return this.#deliver(number, camera, null);

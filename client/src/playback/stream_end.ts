@@ -6,9 +6,9 @@
 //               ended: at the tail of what is still being recorded the server waits for more, and only then ends it.
 
 import type { Footage } from "../wire/footage";
+import { isTemporary } from "../wire/outage";
 import type { Recordings } from "../wire/recordings";
 import type { ServerError } from "../wire/server";
-import { isPassing } from "./failure_reason";
 
 /** The server waits longer for what is still being recorded, and not at all when another player takes over. */
 const kTailSilenceMs = 1_500;
@@ -36,7 +36,7 @@ export interface LastFrame {
 export async function streamEnd(recordings: Recordings, before: Footage, last: LastFrame): Promise<StreamEnd> {
   if (last.isWhole && !before.isGrowing) return { kind: "ended", footage: before };
   const wasAtTail = last.isWhole || (before.isGrowing && last.ageMs >= kTailSilenceMs);
-  const footage = await recordings.find(before).catch((error: ServerError) => (isPassing(error) ? "lost" : before));
+  const footage = await recordings.find(before).catch((error: ServerError) => (isTemporary(error) ? "lost" : before));
   if (footage === "lost") return { kind: "lost" };
   if (!footage) return { kind: "removed" };
   if (!wasAtTail) return { kind: "preempted", footage };

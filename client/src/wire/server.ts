@@ -20,8 +20,8 @@ export interface Account {
 const kAnswerTimeoutMs = 20_000;
 /** Once the last byte of a file has gone, the server may work on it. */
 const kUploadTimeoutMs = 40_000;
-/** The web server's own word, where it has reached nobody. */
-const kNoHost = "the web API does not answer";
+/** What the web server answers where it cannot reach the web API. */
+const kUnreachableMessage = "the web API does not answer";
 const kTooManyAttempts = "Too many attempts. Please wait a minute.";
 
 /** A request that failed; `message` is for the user. */
@@ -51,7 +51,7 @@ interface Failure {
   error?: { code?: number; message?: string; data?: unknown };
 }
 
-/** `noAnswer` is for 502, where the host's handler gave none. */
+/** `noAnswer`: what to say for a 502 of the host itself, whose handler has given no answer. */
 function sentenceFor(status: number, serverMessage?: string, noAnswer?: string): string {
   switch (status) {
     case 0:
@@ -61,7 +61,7 @@ function sentenceFor(status: number, serverMessage?: string, noAnswer?: string):
     case 429:
       return serverMessage ? sentenceOf(serverMessage) : kTooManyAttempts;
     case 502:
-      if (serverMessage === kNoHost) return sentenceFor(0);
+      if (serverMessage === kUnreachableMessage) return sentenceFor(0);
       return noAnswer ?? "The server could not answer (502).";
     case 503:
       return serverMessage ? sentenceOf(serverMessage) : "The server is busy.";
@@ -170,7 +170,7 @@ export class Server {
 
   /**
    * An answer that holds pictures, or a file of them; a JSON answer, whatever its status, is a failure. `noAnswer` is
-   * what to say where the host's handler gave none, as for a camera that cannot be opened: no user would understand that.
+   * what to say where the host's handler has given none, as for a camera that cannot be opened.
    */
   async media(
     api: string,

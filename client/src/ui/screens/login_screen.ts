@@ -2,8 +2,8 @@
 //
 // The log-in screen. While the server is away it goes on trying, until it is answered or something else is typed.
 
-import { isPassing } from "../../playback/failure_reason";
 import { keepTrying } from "../../wire/keep_trying";
+import { isTemporary } from "../../wire/outage";
 import { asServerError, ServerError, type Account, type Server } from "../../wire/server";
 import { element } from "../widgets/dom";
 import { icon } from "../widgets/icons";
@@ -40,21 +40,21 @@ export function loginScreen(server: Server, hint: string, onLogin: (account: Acc
     void logIn(account.input.value, password.input.value).finally(() => submit.removeAttribute("aria-busy"));
   });
 
-  async function logIn(name: string, word: string): Promise<void> {
-    const typed = new AbortController();
-    form.addEventListener("input", () => typed.abort(), { once: true });
-    const tell = (sentence: string) => void (message.textContent = sentence);
-    tell("");
+  async function logIn(accountName: string, passwordText: string): Promise<void> {
+    const attempt = new AbortController();
+    form.addEventListener("input", () => attempt.abort(), { once: true });
+    const showMessage = (sentence: string) => void (message.textContent = sentence);
+    showMessage("");
     submit.setAttribute("aria-busy", "true");
     const ask = () =>
-      server.login(name, word, typed.signal).catch((error: unknown) => {
-        if (isPassing(asServerError(error))) throw error;
+      server.login(accountName, passwordText, attempt.signal).catch((error: unknown) => {
+        if (isTemporary(asServerError(error))) throw error;
         return asServerError(error);
       });
-    const answer = await keepTrying(ask, tell, typed.signal);
-    if (!answer) return tell("");
+    const answer = await keepTrying(ask, showMessage, attempt.signal);
+    if (!answer) return showMessage("");
     if (!(answer instanceof ServerError)) return onLogin(answer);
-    tell(answer.message);
+    showMessage(answer.message);
     password.input.select();
   }
   return element("main", { class: "login" }, form);
