@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // lookhaven event: lists, shows, keeps, marks, exports and removes what was recorded.
+#include <exception>
 #include <filesystem>
 #include <optional>
 #include <set>
 
 #include <unistd.h>
 
+#include "standalone/admin/change.h"
 #include "standalone/admin/kept_events.h"
 #include "standalone/admin/removed_events.h"
 #include "standalone/base/clock.h"
@@ -38,6 +40,7 @@ const Names<int> kReasons = {{"continuous", base::kReasonContinuous}, {"alarm", 
 
 struct Request {
     int id = 0;
+    std::vector<int> ids;
     std::string file;
     bool no_sound = false;
     bool footage = false;
@@ -164,16 +167,50 @@ void Release(const Console& console, const Request& request) {
     ChangeKeeping(console, request, release, " is no longer kept.");
 }
 
-void Remove(const Console& console, const Request& request) {
-    store::Store store = console.OpenStore();
-    const Found found = RequireEvent(store, request.id);
+// Returns how many recordings were removed.
+int RemoveOne(store::Store& store, int id, bool with_footage) {
+    const Found found = RequireEvent(store, id);
     std::vector<Event> recordings;
-    if (found.event || request.footage) {
+    if (found.event || with_footage) {
         recordings = RecordingsOf(store, found);
     }
     admin::RemoveEvents(store, {}, recordings, found.mark);
-    console.Answer(Object("id", request.id, "recordings", static_cast<int>(recordings.size())), "Event ", request.id,
-                   " was removed", recordings.empty() ? "." : "; the recorder deletes its footage from the disk.");
+    return static_cast<int>(recordings.size());
+}
+
+// What cannot be removed keeps no other from being removed; a store that fails ends it.
+void Remove(const Console& console, const Request& request) {
+    store::Store store = console.OpenStore();
+    Json::Value removed = Json::arrayValue;
+    std::string text;
+    std::optional<Failure> refusal;
+    std::exception_ptr failure;
+    const auto refuse = [&](ExitCode code, const char* why) {
+        refusal = refusal ? Failure(refusal->Code(), refusal->what(), "; ", why) : Failure(code, why);
+    };
+    for (auto id = request.ids.begin(); id != request.ids.end() && !failure; ++id) {
+        try {
+            const int recordings = RemoveOne(store, *id, request.footage);
+            removed.append(Object("id", *id, "recordings", recordings));
+            text += Concat("Event ", *id, " was removed",
+                           recordings == 0 ? ".\n" : "; the recorder deletes its footage from the disk.\n");
+        } catch (const Failure& error) {
+            refuse(error.Code(), error.what());
+        } catch (const admin::StillNeeded& error) {
+            refuse(kDataError, error.what());
+        } catch (...) {
+            failure = std::current_exception();
+        }
+    }
+    if (!removed.empty()) {
+        console.Answer(removed, text);
+    }
+    if (failure) {
+        std::rethrow_exception(failure);
+    }
+    if (refusal) {
+        throw *refusal;
+    }
 }
 
 void AddMark(const Console& console, const Request& request) {
@@ -259,9 +296,9 @@ void AddEvent(CLI::App& program, const Console& console) {
         .Option("id", request.id, id, Required)
         .Option("--note", request.note, "Why it is kept");
     group.Add("release", "Releases a kept event", Release).Option("id", request.id, id, Required);
-    group.Add("remove", "Deletes a recorded event, or an alert or POS transaction with its text", Remove)
-        .Option("id", request.id, id, Required)
-        .Flag("--footage", request.footage, "Of an alert or POS transaction: also the recordings of its footage");
+    group.Add("remove", "Deletes recorded events, or alerts and POS transactions with their text", Remove)
+        .Option("id", request.ids, "The events' ids", Required)
+        .Flag("--footage", request.footage, "Of alerts and POS transactions: also the recordings of their footage");
     group.Add("mark", "Reports an alert or POS transaction with its footage", AddMark)
         .Option("camera", request.camera, "The camera's id", Required)
         .Option("--kind", request.mark_kind, "What to report (default: alert)", OneOf(store::MarkKindNames()))
