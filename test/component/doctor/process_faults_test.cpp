@@ -171,6 +171,13 @@ TEST_F(DoctorTest, AHostThatIsOfflineIsNamedAndAMachineThatIsNoneIsTold) {
                    "-new")();
          },
          "do: lookhaven mount add FOLDER\n"},
+        {"shared mount on a host of which nothing is known",
+         [&] {
+             Sql("update mounts set host_id = -1, path = path || '-away' where host_id = 2")();
+             Sql("insert into shared_mount_hosts (mount_id, host_id) select id, 2 from mounts where host_id = -1")();
+             maintenance::WriteHostStatus(base::Installation(home_), {{1, maintenance::HostState::kLocal, 0}});
+         },
+         "-away is not there", report(maintenance::HostState::kOnline)},
     };
     ExpectFoundAndMended(faults);
     Sql("update hosts set version = 'v' || id")();

@@ -138,12 +138,14 @@ TEST_F(MountMaintenanceTest, CountsTheRetentionRunsThatFail) {
     Pass(20, 400 * 86'400);
     Pass(3600);
     const control::MountCounters before = maintenance_->Counters();
+    footage_.Record(1, kNoon - 100, 60);
     const fs::path file =
         footage_.Mount() / store::Events(footage_.Records()).Find(footage_.Record(1, kNoon, 60))->path;
     fs::remove(file);
     fs::create_directories(file / "not-empty");
     Pass(20);
     EXPECT_EQ(maintenance_->Counters().retention_failures, before.retention_failures + 1);
+    EXPECT_EQ(maintenance_->Counters().deleted_events, before.deleted_events + 1) << "what it deleted before it failed";
     EXPECT_GT(maintenance_->Counters().retention_runs, before.retention_runs);
     EXPECT_EQ(State(), MountState::kFailing);
 }
