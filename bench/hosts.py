@@ -167,8 +167,8 @@ def print_rows(bin_folder):
 
 @contextlib.contextmanager
 def two_hosts(bin_folder, server):
-    """The stand whose camera 1 sends pictures, one that has nothing but the store and a recorder, which gets them from
-    there, and a cookie for both."""
+    """The stand whose camera 1 sends pictures, one that has nothing but the store and a recorder, which fetches its
+    stream, and a cookie for both."""
     store = server.new_database("live")
     with contextlib.ExitStack() as stack:
         stands = []

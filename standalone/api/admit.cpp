@@ -67,7 +67,8 @@ const char* SessionCookie(const http::Request& request) {
 
 CostClass CostClassOf(const Call& call) {
     const bool probes_camera = call.api == kCameraApi.name && call.method == "Probe";
-    if (call.api == kSelfAdmittingApi || call.api == kPictureApi.name || probes_camera || IsPlayer(call)) {
+    if (call.api == kSelfAdmittingApi || call.api == kPictureApi.name || call.api == kHostApi.name || probes_camera ||
+        IsPlayer(call)) {
         return CostClass::kPictures;
     }
     const bool counts_footage =
@@ -136,7 +137,7 @@ void Admit(const Call& call, const RequestLimits& limits) {
     }
 }
 
-void AdmitPairedHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits) {
+void AdmitOtherHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits) {
     Occupy(slots, slot, store::kPairedHostUserId, limits.per_user, limits.without_managers);
 }
 

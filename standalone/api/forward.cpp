@@ -23,7 +23,6 @@ namespace lookhaven::api {
 
 namespace {
 
-constexpr const char* kTokenHeader = "HTTP_X_LOOKHAVEN_FORWARDED";
 constexpr std::chrono::seconds kMaxSilentLive{60};
 // Small, since pictures that wait in it grow old where the viewer cannot keep up.
 constexpr int kLiveReceiveBytes = 64 << 10;
@@ -165,7 +164,7 @@ Failure Offline(const store::Host& host, const std::string& what, const std::str
 }  // namespace
 
 bool TakeForwarded(http::Request& request, const base::Installation& installation) {
-    const auto token = request.headers.find(kTokenHeader);
+    const auto token = request.headers.find(remote::kForwardHeaderInScgi);
     const int own_host = token == request.headers.end() ? 0 : installation.HostId();
     if (own_host == 0) {
         return false;
@@ -182,7 +181,8 @@ bool TakeForwarded(http::Request& request, const base::Installation& installatio
 }
 
 std::string LinesForForwarder(const http::Request& request) {
-    return request.headers.contains(kTokenHeader) ? base::Concat(remote::kHostAnswers, ": yes\r\n") : "";
+    return request.headers.contains(remote::kForwardHeaderInScgi) ? base::Concat(remote::kHostAnswers, ": yes\r\n")
+                                                                  : "";
 }
 
 bool Forward(const Call& call, const store::Host& host, Forwarded kind, const std::string& what) {

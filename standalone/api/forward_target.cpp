@@ -27,7 +27,7 @@ namespace {
 
 // How long hosts are asked for a player, one after another; the last may take three seconds more.
 constexpr std::chrono::seconds kMaxSearch{9};
-// For the recorder to have it; then that host is asked for this viewer alone.
+// For the recorder to have it; after that the request is forwarded.
 constexpr std::chrono::seconds kMaxWaitForStream{3};
 constexpr const char* kLiveApi = "VEXO.Lookhaven.Player.LiveviewSrc";
 
@@ -39,7 +39,8 @@ int IdOf(const Call& call, const char* name) {
 
 bool IsLive(const Call& call) {
     const bool shows_camera = IdOf(call, "itemType") == 0 || IdOf(call, "snapshot") == 1;
-    return (call.api == kLiveApi && shows_camera) || (call.api == kPictureApi.name && call.method == "Get");
+    return (call.api == kLiveApi && shows_camera) || (call.api == kPictureApi.name && call.method == "Get") ||
+           call.api == kHostApi.name;
 }
 
 // By a session, or as a paired host. Anyone else is refused by this host's handler.
@@ -56,9 +57,9 @@ int HostOfCamera(store::Store& records, int camera_id) {
     return camera ? camera->host_id : recording;
 }
 
-// Whether this host's recorder gets the stream from the other one, so that the module finds it here: once for all who
-// watch it here, when there is a second. Nobody waits for that whose host is known to be offline.
-bool ComesHere(const Call& call, int camera_id, int host) {
+// Notes that the camera is watched here. From its second viewer on, waits for this host's recorder to fetch the stream,
+// unless the other host is known to be offline; whether the module finds it here.
+bool AwaitRingHere(const Call& call, int camera_id, int host) {
     if (call.api != kLiveApi || IdOf(call, "snapshot") == 1 || call.is_forwarded) {
         return false;
     }
@@ -80,9 +81,12 @@ bool ComesHere(const Call& call, int camera_id, int host) {
 ForwardTarget TargetOfLive(const Call& call, int own_host) {
     const int camera = IdOf(call, "camera");
     const int host = camera > 0 ? HostOfCamera(call.Records(), camera) : 0;
+    if (call.api == kHostApi.name) {
+        return {call.is_forwarded ? host : 0, Forwarded::kLive, "camera " + std::to_string(camera)};
+    }
     const bool is_for_caller =
         host != 0 && host != own_host && IsAdmitted(call) && binding::MayUse(camera, store::CameraAccess::kLive);
-    const bool is_elsewhere = is_for_caller && !ComesHere(call, camera, host);
+    const bool is_elsewhere = is_for_caller && !AwaitRingHere(call, camera, host);
     return {is_elsewhere ? host : 0, Forwarded::kLive, "camera " + std::to_string(camera)};
 }
 

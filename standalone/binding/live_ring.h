@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Live rings for requests that are not the module's.
+// Live rings for requests that are not the module's (live.cpp).
 #pragma once
 
 #include <chrono>
@@ -12,7 +12,8 @@ class ShmStreamFifo;
 
 namespace lookhaven::binding {
 
-// As LiveStreamFifoAt and, for the sound, LiveAdoStreamFifoAt, but asks for nobody's rights: the caller has.
+// As LiveStreamFifoAt, but checks no rights, which the caller must have done: LiveAdoStreamFifoAt then gives the sound.
+// Waits for five seconds at most; null when no picture came. The ring stays attached until the process ends.
 LH_PLATFORM_API ShmStreamFifo* AttachLiveRing(control::LiveStream stream);
 
 // Whether the stream's ring has a picture, within the limit; asks the recorder for it as a viewer does. Attaches

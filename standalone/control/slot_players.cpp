@@ -55,12 +55,6 @@ int SlotTable::FindForwardedPlayer(std::string_view session, std::int64_t key) c
     return host;
 }
 
-bool SlotTable::IsWatchedByOthers(const Slot& slot, int camera) const {
-    return std::ranges::any_of(Used(), [&](const Slot& other) {
-        return &other != &slot && other.serial != 0 && other.other_hosts_camera == camera && !other.MustEnd();
-    });
-}
-
 std::uint64_t SlotTable::PackPause(std::uint64_t serial, const Pause& pause) {
     const auto rate = static_cast<std::uint8_t>(pause.resumed_rate);
     return serial << kSerialShift | std::uint64_t{rate} << 1 | (pause.on ? 1U : 0U);

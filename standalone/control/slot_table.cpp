@@ -122,6 +122,11 @@ std::size_t SlotTable::CountOthers(const Slot& slot, const std::function<bool(co
         Used(), [&](const Slot& each) { return &each != &slot && each.serial != 0 && counts(each); }));
 }
 
+bool SlotTable::IsWatchedByOthers(const Slot& slot, int camera) const {
+    return CountOthers(slot,
+                       [camera](const Slot& each) { return each.other_hosts_camera == camera && !each.MustEnd(); }) > 0;
+}
+
 QuotaResult SlotTable::BeginRequest(Slot& slot, int user, std::size_t max_of_user, std::size_t max_in_all) {
     const SharedLock lock = TryLock(guard_->mutex);
     if (!lock || CountOthers(slot, [](const Slot& each) { return each.user != 0; }) >= max_in_all) {

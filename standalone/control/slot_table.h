@@ -94,7 +94,7 @@ struct alignas(kSlotBytes) Slot {
     Player player;
     std::atomic<std::int64_t> forwarded_player_key;  // of the player whose stream it forwards; 0: none
     std::atomic<int> player_host_id;                 // the host where that player runs
-    std::atomic<int> other_hosts_camera;             // that its client watches; 0: none
+    std::atomic<int> other_hosts_camera;             // which its client watches live; 0: none
 
     bool MustEnd() const { return ended == serial; }
 };

@@ -44,7 +44,7 @@ struct CameraPlan {
 struct CatalogContents {
     std::map<control::LiveStream, StreamPlan> streams;
     std::map<int, CameraPlan> cameras;  // by id
-    std::map<int, OtherHost> hosts;     // that share the store, but this one; by id
+    std::map<int, OtherHost> hosts;     // the other hosts of the store, by id
     std::map<int, bool> mounts;         // of this host, by id; whether enabled
     bool is_read = false;               // false: the store has not been reached yet
 };

@@ -23,10 +23,14 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::seconds kMaxHeadWait{10};  // longer than that host waits for a picture
 constexpr std::chrono::milliseconds kStep{100};
-// The two clocks run alike but for some seconds a day.
-constexpr std::int64_t kMaxClockErrorUs = 200'000;
+// Two clocks drift apart by some seconds a day: by less than one part in so many.
+constexpr std::int64_t kDriftParts = 5'000;
+// No clock counts more microseconds.
+constexpr std::int64_t kMaxClockUs = std::int64_t{1} << 60;
 constexpr std::size_t kMaxBodyBytes = base::kMaxFrameBytes;
 constexpr int kOk = 200;
+constexpr int kForbidden = 403;
+constexpr int kNotFound = 404;
 
 // What that host sends, in the thread that reads it.
 class Connection : remote::AnswerSink {
@@ -58,7 +62,7 @@ class Connection : remote::AnswerSink {
     }
 
     // The next bytes, valid until the next call. Throws media::SourceError when the answer has ended, on a stop request,
-    // and at the time that is due.
+    // or when due has passed.
     std::span<const char> Read(std::size_t size, Clock::time_point due) {
         if (received_.size() - read_ < size) {
             received_.erase(received_.begin(), received_.begin() + static_cast<std::ptrdiff_t>(read_));
@@ -69,7 +73,7 @@ class Connection : remote::AnswerSink {
             if (stop_.stop_requested()) {
                 throw media::SourceError("stopped");
             }
-            if (!goes_on) {
+            if (!goes_on && received_.size() - read_ < size) {
                 throw media::SourceError(failure_);
             }
             if (Clock::now() > due) {
@@ -83,7 +87,11 @@ class Connection : remote::AnswerSink {
   private:
     bool Begin(const remote::AnswerHead& head) override {
         if (head.status != kOk) {
-            failure_ = name_ + " has no picture of it, or is of another version: status " + std::to_string(head.status);
+            failure_ = name_ +
+                       (head.status == kForbidden  ? " refuses: are the clocks more than five minutes apart?"
+                        : head.status == kNotFound ? " knows no such request: it is of another version"
+                                                   : " has no picture of it") +
+                       " (status " + std::to_string(head.status) + ")";
         }
         return head.status == kOk;
     }
@@ -103,16 +111,12 @@ class Connection : remote::AnswerSink {
     std::unique_ptr<remote::Forwarding> forwarding_;  // last: it uses the others
 };
 
-// A host that shares the store is believed, but not that it is of this version, or sound.
-[[noreturn]] void Refuse(const char* what) {
-    throw media::SourceError(std::string("the other host sent ") + what);
-}
-
 class HostStream : public media::Source {
   public:
     HostStream(const OtherHost& other, control::LiveStream stream, const media::SourceOptions& options,
                std::stop_token stop)
-        : limit_(options.no_data_limit),
+        : name_("host " + other.name),
+          limit_(options.no_data_limit),
           connection_(other, stream, std::move(stop)) {
         while (!video_) {
             TakeFormat(ReadMessage());
@@ -145,6 +149,9 @@ class HostStream : public media::Source {
     }
 
   private:
+    // A host that shares the store is believed, but not that it is of this version, or sound.
+    [[noreturn]] void Refuse(const char* what) const { throw media::SourceError(name_ + " sent " + what); }
+
     // Leaves the body in body_, until the next one is read.
     ring::MessageHead ReadMessage() {
         ring::MessageHead head;
@@ -181,34 +188,39 @@ class HostStream : public media::Source {
         NoteClock(head.timestamp_us);
     }
 
-    // What was under way for longer is no reason to take the clock for a slower one.
+    // Being under way only adds to the difference of the clocks, so the smallest is the best estimate; it may grow as
+    // slowly as clocks drift.
     void NoteClock(std::int64_t sent_us) {
-        const std::int64_t ahead_us = Distance(base::MonotonicMicros(), sent_us);
-        if (!ahead_us_ || ahead_us < *ahead_us_ || ahead_us > *ahead_us_ + kMaxClockErrorUs) {
-            ahead_us_ = ahead_us;
-        }
+        const std::int64_t now_us = base::MonotonicMicros();
+        const std::int64_t offset_us = now_us - Checked(sent_us);
+        const std::int64_t drift_us = (now_us - noted_us_) / kDriftParts;
+        offset_us_ = noted_us_ == 0 ? offset_us : std::min(offset_us, offset_us_ + drift_us);
+        noted_us_ = now_us;
     }
 
-    // By this host's clock; never in the future, whatever the other says.
+    // By this host's clock; never in the future.
     std::int64_t OwnTime(std::int64_t theirs_us) const {
         const std::int64_t now_us = base::MonotonicMicros();
-        const std::int64_t own_us = Distance(theirs_us, -ahead_us_.value_or(0));
-        return std::clamp(own_us, now_us - kMaxAgeUs, now_us);
+        return std::clamp(Checked(theirs_us) + offset_us_, now_us - kMaxAgeUs, now_us);
     }
 
-    // a - b, that wraps.
-    static std::int64_t Distance(std::int64_t a, std::int64_t b) {
-        return static_cast<std::int64_t>(static_cast<std::uint64_t>(a) - static_cast<std::uint64_t>(b));
+    std::int64_t Checked(std::int64_t time_us) const {
+        if (time_us < 0 || time_us > kMaxClockUs) {
+            Refuse("a time that no clock shows");
+        }
+        return time_us;
     }
 
     static constexpr std::int64_t kMaxAgeUs = 600'000'000;
 
+    const std::string name_;
     const std::chrono::milliseconds limit_;
     Clock::time_point due_ = Clock::now() + std::max<Clock::duration>(limit_, kMaxHeadWait);
     std::span<const char> body_;
     std::optional<media::StreamFormat> video_;
     std::optional<media::StreamFormat> audio_;
-    std::optional<std::int64_t> ahead_us_;  // of that host's clock
+    std::int64_t offset_us_ = 0;  // this host's clock minus that one's …
+    std::int64_t noted_us_ = 0;   // … as noted then; 0: not yet
     Connection connection_;
 };
 

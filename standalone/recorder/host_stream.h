@@ -14,19 +14,19 @@
 
 namespace lookhaven::recorder {
 
-// A host that has a camera, and what it takes this one by.
+// Another host of the store, and what a request to it needs.
 struct OtherHost {
     int id = 0;
     std::string name;
     remote::Host host;
-    std::string key;          // of the store's sessions
-    std::string own_address;  // of this host, as the other knows it
+    std::string key;          // the store's, by which forward tokens are made
+    std::string own_address;  // the client that the token names: this host
 
     bool operator==(const OtherHost&) const = default;
 };
 
-// As media::OpenSource. The formats of its sound have neither rate nor channels, so its packets can be shown but not
-// recorded.
+// As media::OpenSource, without credentials: blocks for ten seconds at most until the formats are known. Those of sound
+// have neither rate nor channels, so it can be heard but not recorded.
 std::unique_ptr<media::Source> OpenHostStream(const OtherHost& other, control::LiveStream stream,
                                               const media::SourceOptions& options, std::stop_token stop);
 

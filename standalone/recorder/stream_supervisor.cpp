@@ -131,6 +131,7 @@ std::optional<StreamPlan> StreamSupervisor::PlanOf(const CatalogContents& catalo
         return std::nullopt;
     }
     StreamPlan result = plan->second;
+    // A holder that is not in the catalog was removed, and its lease goes in a moment.
     if (const auto host = catalog.hosts.find(*holder); host != catalog.hosts.end()) {
         result.other_host = host->second;
     }
@@ -159,6 +160,9 @@ void StreamSupervisor::PublishCounters() {
     streams.reserve(workers_.size());
     std::erase_if(rates_, [this](const auto& rate) { return !workers_.contains(rate.first); });
     for (const auto& [stream, worker] : workers_) {
+        if (worker->Plan().other_host) {
+            continue;
+        }
         const StreamCounts counts = worker->Counts();
         control::StreamCounters& published = streams.emplace_back();
         published.stream = stream;
@@ -181,8 +185,8 @@ void StreamSupervisor::CorrectVideoTypes() {
     for (const auto& [stream, worker] : workers_) {
         const auto plan = catalog->cameras.find(stream.camera);
         const std::optional<base::Codec> codec = worker->Signal().codec;
-        if (codec && plan != catalog->cameras.end() && plan->second.live_profile == stream.stream &&
-            plan->second.video_type != *codec) {
+        if (codec && !worker->Plan().other_host && plan != catalog->cameras.end() &&
+            plan->second.live_profile == stream.stream && plan->second.video_type != *codec) {
             catalog_.CorrectVideoType(stream.camera, *codec);
         }
     }

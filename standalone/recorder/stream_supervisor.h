@@ -44,7 +44,8 @@ class StreamSupervisor {
     void DoEverySecond();
     void Reconcile();
     void DropEndedWorkers();
-    // Where to get the stream from; nothing for one that does not exist, or of whose camera that is not known yet.
+    // The stream's plan, with the host to fetch it from where another host has the camera. Nothing where there is no
+    // such stream, and while it is not known who has which camera.
     std::optional<StreamPlan> PlanOf(const CatalogContents& catalog, control::LiveStream stream) const;
     std::map<int, CameraSignal> Signals() const;
     void PublishCounters();

@@ -73,7 +73,7 @@ void StreamWorker::Run(const std::stop_token& stop) {
             } catch (const std::exception& failure) {
                 if (!stop.stop_requested()) {
                     ReportFailure(failure);
-                    // Whoever watches another host's camera learns from the web API what is wrong with that host.
+                    // Viewers of another host's camera connect again, and the web API tells them if that is offline.
                     plan_.other_host ? rings.Close() : rings.EndRun();
                     WaitToTryAgain(rings, stop);
                 }

@@ -30,7 +30,7 @@ struct StreamPlan {
     std::string url;
     media::Credentials credentials;
     bool insecure = false;                     // as in media::SourceOptions
-    std::optional<OtherHost> other_host = {};  // which has the camera, and is asked in its place
+    std::optional<OtherHost> other_host = {};  // to fetch it from in place of the camera
 
     // Whether a running stream can go on: renaming a camera does not interrupt it.
     bool HasSourceOf(const StreamPlan& other) const {

@@ -79,7 +79,7 @@ class ForwardedTransfer : public Forwarding {
         has_come_ = false;
         int running = 0;
         if (::curl_multi_perform(multi_.get(), &running) != CURLM_OK) {
-            throw NoAnswer("the connection cannot be made");
+            throw std::bad_alloc();
         }
         if (running == 0) {
             int left = 0;
@@ -87,8 +87,9 @@ class ForwardedTransfer : public Forwarding {
             End(message == nullptr ? CURLE_RECV_ERROR : message->data.result);
             return false;
         }
-        if (!has_come_) {
-            ::curl_multi_poll(multi_.get(), nullptr, 0, static_cast<int>(limit.count()), nullptr);
+        if (!has_come_ &&
+            ::curl_multi_poll(multi_.get(), nullptr, 0, static_cast<int>(limit.count()), nullptr) != CURLM_OK) {
+            throw std::bad_alloc();
         }
         return true;
     }

@@ -57,8 +57,8 @@ class Forwarding {
   public:
     virtual ~Forwarding() = default;
 
-    // Gives the sink what has come; where that is nothing, waits for something, at most so long. False when the answer
-    // has ended, or the sink has ended it: then only ask IsComplete. Throws as Forward.
+    // Gives the sink what has come; where that is nothing, waits for something, at most so long, which the next step
+    // gives. False when the answer has ended, or the sink has ended it: then only ask IsComplete. Throws as Forward.
     virtual bool Step(std::chrono::milliseconds limit) = 0;
     virtual bool IsComplete() const = 0;
 };
@@ -70,7 +70,7 @@ inline bool Finish(Forwarding& forwarding) {
     return forwarding.IsComplete();
 }
 
-// Nothing is sent before the first Step, within a second of which the next must follow. Borrows the sink. Throws
+// Nothing is sent before the first Step; call it at least once a second. Borrows the sink. Throws
 // InvalidCertificate; and std::runtime_error when the library cannot be loaded.
 std::unique_ptr<Forwarding> BeginForward(const Host& host, const ForwardedRequest& request, AnswerSink& sink);
 

@@ -33,7 +33,7 @@ std::string MakeForwardToken(std::string_view key, int to_host, std::string_view
 }
 
 std::string ForwardTokenLine(std::string_view key, int to_host, std::string_view client, std::int64_t now_s) {
-    return "X-Lookhaven-Forwarded: " + MakeForwardToken(key, to_host, client, now_s);
+    return std::string(kForwardHeader) + ": " + MakeForwardToken(key, to_host, client, now_s);
 }
 
 std::optional<std::string> ClientInForwardToken(std::string_view token, std::string_view key, int own_host,

@@ -19,7 +19,9 @@ constexpr std::int64_t kForwardTokenWindowSeconds = 300;
 // key: 64 hexadecimal digits, else std::invalid_argument is thrown. client: without spaces.
 std::string MakeForwardToken(std::string_view key, int to_host, std::string_view client, std::int64_t now_s);
 
-// The same as the header line of a request.
+// The header of a request that carries such a token, as a line and as SCGI names it.
+constexpr std::string_view kForwardHeader = "X-Lookhaven-Forwarded";
+constexpr const char* kForwardHeaderInScgi = "HTTP_X_LOOKHAVEN_FORWARDED";
 std::string ForwardTokenLine(std::string_view key, int to_host, std::string_view client, std::int64_t now_s);
 
 // The client's address; nothing for a token that was not made by the key for that host, or not within the window around

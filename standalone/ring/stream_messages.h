@@ -4,7 +4,7 @@
 //
 //   kFormat of the sound, unless it is silent, and of the picture; then frames as they are written, and kClock
 //
-// Between kFormat and the next connection the formats stay as they are. Hosts may be of two versions, so what is here
+// Formats do not change within a connection. Hosts may be of two versions, so what is here
 // only grows: types that the receiver does not know are skipped.
 #pragma once
 
@@ -23,7 +23,7 @@ enum class MessageType : std::uint8_t { kFormat = 1, kFrame, kClock };
 // In front of every body.
 struct MessageHead {
     std::uint8_t type = 0;
-    std::uint8_t medium = 0;  // of kFormat and kFrame: a Medium
+    std::uint8_t medium = 0;  // of kFormat and kFrame: a base::Medium
     std::uint8_t is_key = 0;  // of kFrame
     std::uint8_t unused = 0;
     std::uint32_t body_bytes = 0;

@@ -4,6 +4,7 @@
 import hashlib
 import hmac
 import json
+import re
 import sys
 import time
 import unittest
@@ -74,17 +75,24 @@ class HostsTest(unittest.TestCase):
         key = bytes.fromhex(self.sql("select value from settings where name = 'session_key'"))
         return said + hmac.new(key, f"lookhaven forward 1\n{host}\n{said}".encode(), hashlib.sha256).hexdigest()
 
+    def is_fetched(self, camera):
+        """While two watch it there."""
+        with self.other.live(camera) as first, self.other.live(camera) as second:
+            first.next(), second.next()
+            return re.search(rf'camera {camera} "\w+" stream 0: live', (self.other.home / "log/recorder.log").read_text())
+
     def test_live_pictures_come_through(self):
         wait_until(lambda: self.other.request(call(LIVE, "Play", camera=1, snapshot=1), "viewer").status == 200, 15, "a snapshot")
         passed, direct = (server.request(call(LIVE, "Play", camera=2, snapshot=1), "admin") for server in (self.other, self.owner))
         self.assertEqual((passed.status, passed.body), (direct.status, direct.body), "it is no JPEG camera's")
         self.assertEqual(direct.status, 502)
         for camera, kinds in ((1, {"image/jpeg"}), (2, {"image/H264", "audio/AAC"})):
+            wait_until(lambda: self.is_fetched(camera), 30, "the recorder fetches what a second viewer watches")
+            wait_until(lambda: len(self.other.requests()) <= 1, 5, "those streams end")
             with self.other.live(camera) as first, self.other.live(camera) as second, self.other.live(camera) as third:
                 heads = [each.next()[0] for _ in range(40) for each in (first, second, third)]
-                if camera == 1:
-                    self.assertEqual([len(server.requests()) for server in (self.owner, self.other)], [3, 4],
-                                     "one stream for the first viewer, one for all others")
+                # Its watcher is among them, and the stream of a camera that was watched before may be.
+                self.assertLessEqual(len(self.owner.requests()), 2 + camera, "of three viewers one has its own stream")
             self.assertEqual({head["content-type"] for head in heads[2::3]}, kinds)
             self.assertLess(max(float(head["x-age-ms"]) for head in heads[-3:]), 1000)
             wait_until(lambda: len(self.other.requests()) <= 1, 5, "streams end with their viewers")
@@ -276,8 +284,8 @@ class HostsTest(unittest.TestCase):
             first.next(), second.next()
             self.owner.stop()
             wait_until(lambda: first.ends() and second.ends(), 10, "its streams end")
-        for part, line in (("webapi", f"host North broke off its answer to {LIVE}/Play"), ("recorder", "host North has ended")):
-            wait_until(lambda: line in (self.other.home / f"log/{part}.log").read_text(), 5, "that is logged")
+        log = self.other.home / "log/webapi.log"
+        wait_until(lambda: f"host North broke off its answer to {LIVE}/Play" in log.read_text(), 5, "that is logged")
         for query in queries:
             began = time.monotonic()
             answer = self.other.request(query, "viewer")

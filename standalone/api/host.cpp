@@ -2,9 +2,9 @@
 //
 // VEXO.Host: what only another host of the same store may ask.
 //
-// Why so        A viewer of that host may watch a camera of this one, and so may ten. Its recorder asks for the stream
-//               once, and fills rings of its own with it. Who of its viewers may see and hear it, that host judges by
-//               the store that both have: a host that lies about it has the store, and could make itself a session.
+// Why so        Many viewers of that host may watch one camera of this one. Its recorder fetches the stream once, and
+//               fills rings of its own with it. Who of its viewers may see and hear it, that host judges by the store
+//               that both have: a host that lies about it has the store, and could make itself a session.
 #include "standalone/api/own_apis.h"
 
 #include <algorithm>
@@ -26,7 +26,7 @@ namespace lookhaven::api {
 namespace {
 
 constexpr std::int64_t kClockIntervalUs = 5'000'000;
-// A camera that sends nothing is asked for anew.
+// Longer than the recorder that asks waits for a picture.
 constexpr std::int64_t kMaxSilentUs = 20'000'000;
 constexpr std::chrono::milliseconds kPause{2};
 
@@ -42,15 +42,15 @@ bool Send(const Call& call, ring::MessageType type, const void* ring_address, st
     return call.context.output()->Send(pieces);
 }
 
-bool SendFormat(const Call& call, const void* ring_address) {
+void SendFormat(const Call& call, const void* ring_address) {
     ring::FormatBody format{ring::Width(ring_address), ring::Height(ring_address)};
     std::strncpy(format.codec.data(), ring::Codec(ring_address), format.codec.size() - 1);
     std::array<unsigned char, sizeof format + ring::kMaxExtraBytes> body{};
     const std::span<const unsigned char> extra = ring::ExtraData(ring_address);
     std::memcpy(body.data(), &format, sizeof format);
     std::copy(extra.begin(), extra.end(), body.begin() + sizeof format);
-    return Send(call, ring::MessageType::kFormat, ring_address, std::span(body).first(sizeof format + extra.size()),
-                base::MonotonicMicros());
+    Send(call, ring::MessageType::kFormat, ring_address, std::span(body).first(sizeof format + extra.size()),
+         base::MonotonicMicros());
 }
 
 // One of the stream's two rings.
@@ -58,8 +58,8 @@ class RingReader {
   public:
     explicit RingReader(ShmStreamFifo& ring) : ring_(ring) { ring_.StartRead(&position_); }
 
-    // Sends the next entry; false when there is none yet, or the connection is broken. Of the picture it first waits a
-    // tenth of a second for an entry of either ring.
+    // Sends the next entry; false when there is none yet, or the connection is broken. The pictures' waits up to a tenth
+    // of a second for an entry of either ring.
     bool SendNext(const Call& call) {
         DataEntry* const held = ring_.ReadNext(sequence_, &position_);
         bool is_sent = false;
