@@ -29,8 +29,7 @@ constexpr std::int64_t kFootageElsewhereS = 900;
 RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                                          std::chrono::milliseconds no_data_limit,
                                          std::chrono::milliseconds host_offline_limit)
-    : installation_(installation),
-      no_data_limit_(no_data_limit),
+    : no_data_limit_(no_data_limit),
       flush_requests_(installation),
       camera_status_(installation),
       mount_counters_(installation),

@@ -69,7 +69,6 @@ class RecordingSupervisor {
     bool FootageHasEnded(const store::Mark& mark) const;
     bool IsHeldElsewhere(int camera) const;
 
-    const base::Installation& installation_;
     const std::chrono::milliseconds no_data_limit_;
     control::FlushRequests flush_requests_;
     CameraStatusTracker camera_status_;
