@@ -137,8 +137,12 @@ void Admit(const Call& call, const RequestLimits& limits) {
     }
 }
 
-void AdmitOtherHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits) {
+void AdmitPairedHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits) {
     Occupy(slots, slot, store::kPairedHostUserId, limits.per_user, limits.without_managers);
+}
+
+void AdmitHost(control::SlotTable& slots, control::Slot& slot, int host, const RequestLimits& limits) {
+    Occupy(slots, slot, -host, limits.per_user, limits.without_managers);  // no account has such an id
 }
 
 }  // namespace lookhaven::api

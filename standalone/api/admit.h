@@ -22,7 +22,7 @@ std::optional<binding::Login> FindLogin(const Call& call);
 // How many admitted requests run at once.
 struct RequestLimits {
     std::size_t without_managers = 256;  // of all callers but managers
-    std::size_t per_user = 64;           // other hosts are one user together
+    std::size_t per_user = 64;           // paired hosts are one user together, a host of the store is one
     std::size_t searches_per_user = 4;
 };
 
@@ -40,7 +40,10 @@ CostClass CostClassOf(const Call& call);
 // those beyond the limit wait, ten seconds at most.
 void Admit(const Call& call, const RequestLimits& limits);
 
-// Counts the request as one of other hosts, paired or of the same store. Throws Failure 503 beyond a limit.
-void AdmitOtherHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits);
+// Counts the request as one of the paired hosts. Throws Failure 503 beyond a limit.
+void AdmitPairedHost(control::SlotTable& slots, control::Slot& slot, const RequestLimits& limits);
+
+// The same, as one of that host of the store.
+void AdmitHost(control::SlotTable& slots, control::Slot& slot, int host, const RequestLimits& limits);
 
 }  // namespace lookhaven::api

@@ -24,6 +24,8 @@ namespace lookhaven::api {
 namespace {
 
 constexpr std::chrono::seconds kMaxSilentLive{60};
+// Less than for others, since a viewer may have waited for a ring before.
+constexpr std::chrono::seconds kMaxLiveHeadWait{24};
 // Small, since pictures that wait in it grow old where the viewer cannot keep up.
 constexpr int kLiveReceiveBytes = 64 << 10;
 constexpr std::size_t kMaxTagBytes = 100;
@@ -67,6 +69,7 @@ remote::ForwardedRequest RequestOf(const Call& call, const store::Host& host, Fo
     binding::AppendCompactJson(request.json, parameters);
     if (kind == Forwarded::kLive) {
         request.max_silent = kMaxSilentLive;
+        request.max_head_wait = kMaxLiveHeadWait;
         request.receive_bytes = kLiveReceiveBytes;
     }
     if (kind == Forwarded::kSearch) {
@@ -178,6 +181,19 @@ bool TakeForwarded(http::Request& request, const base::Installation& installatio
     }
     request.headers["REMOTE_ADDR"] = *client;
     return true;
+}
+
+int RequireHost(const Call& call) {
+    const auto token = call.request.headers.find(remote::kHostHeaderInScgi);
+    const int own_host = token == call.request.headers.end() ? 0 : call.context.Installation().HostId();
+    const std::optional<int> host =
+        own_host == 0
+            ? std::nullopt
+            : remote::HostInToken(token->second, store::Sessions(call.Records()).Key(), own_host, base::WallSeconds());
+    if (!host || *host == own_host || !store::Hosts(call.Records()).Find(*host)) {
+        throw Failure(403, "only another host of this installation may ask for this");
+    }
+    return *host;
 }
 
 std::string LinesForForwarder(const http::Request& request) {

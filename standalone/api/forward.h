@@ -21,6 +21,10 @@ namespace lookhaven::api {
 // where the request claims to be forwarded and its token does not prove it; store::StoreError.
 bool TakeForwarded(http::Request& request, const base::Installation& installation);
 
+// The other host of the store that makes the request in its own name. Throws Failure 403 for anybody else;
+// store::StoreError.
+int RequireHost(const Call& call);
+
 // The header lines by which the host that has forwarded the request knows that this host has answered, for a failure;
 // none for another request.
 std::string LinesForForwarder(const http::Request& request);

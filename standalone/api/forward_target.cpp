@@ -39,8 +39,7 @@ int IdOf(const Call& call, const char* name) {
 
 bool IsLive(const Call& call) {
     const bool shows_camera = IdOf(call, "itemType") == 0 || IdOf(call, "snapshot") == 1;
-    return (call.api == kLiveApi && shows_camera) || (call.api == kPictureApi.name && call.method == "Get") ||
-           call.api == kHostApi.name;
+    return (call.api == kLiveApi && shows_camera) || (call.api == kPictureApi.name && call.method == "Get");
 }
 
 // By a session, or as a paired host. Anyone else is refused by this host's handler.
@@ -48,13 +47,6 @@ bool IsAdmitted(const Call& call) {
     const auto timestamp = call.cookies.find("timestamp");
     return call.login || (timestamp != call.cookies.end() && call.Parameter("cookie").isString() &&
                           IsAuthPairMatch(call.Parameter("cookie").asString(), timestamp->second));
-}
-
-// The host that records the camera, else the one that is configured to.
-int HostOfCamera(store::Store& records, int camera_id) {
-    const int recording = store::Hosts(records).HostOfCamera(camera_id);
-    const auto camera = recording == 0 ? store::Cameras(records).Find(camera_id) : std::nullopt;
-    return camera ? camera->host_id : recording;
 }
 
 // Notes that the camera is watched here. From its second viewer on, waits for this host's recorder to fetch the stream,
@@ -81,9 +73,6 @@ bool AwaitRingHere(const Call& call, int camera_id, int host) {
 ForwardTarget TargetOfLive(const Call& call, int own_host) {
     const int camera = IdOf(call, "camera");
     const int host = camera > 0 ? HostOfCamera(call.Records(), camera) : 0;
-    if (call.api == kHostApi.name) {
-        return {call.is_forwarded ? host : 0, Forwarded::kLive, "camera " + std::to_string(camera)};
-    }
     const bool is_for_caller =
         host != 0 && host != own_host && IsAdmitted(call) && binding::MayUse(camera, store::CameraAccess::kLive);
     const bool is_elsewhere = is_for_caller && !AwaitRingHere(call, camera, host);
@@ -169,6 +158,12 @@ bool ForwardControl(const Call& call, int own_host) {
 }
 
 }  // namespace
+
+int HostOfCamera(store::Store& records, int camera_id) {
+    const int recording = store::Hosts(records).HostOfCamera(camera_id);
+    const auto camera = recording == 0 ? store::Cameras(records).Find(camera_id) : std::nullopt;
+    return camera ? camera->host_id : recording;
+}
 
 bool ForwardIfNeeded(const Call& call) {
     const bool steers_player = call.api == kPlaybackApi.name;

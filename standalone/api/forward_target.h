@@ -21,6 +21,9 @@ struct ForwardTarget {
     std::string what;  // that the host has, for an error message: as in Forward
 };
 
+// The host that records the camera, else the one that is configured to; 0 where that is nobody.
+int HostOfCamera(store::Store& records, int camera_id);
+
 // False where this host answers the call itself, also where the caller may not have what it asks for: the refusal is
 // the same everywhere. True when another host has answered it on standard output. Only for an admitted call. Throws
 // Failure: 503 where that host is offline, the call was forwarded to the wrong one, or no host has a shared mount; 409

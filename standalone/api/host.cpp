@@ -5,6 +5,7 @@
 // Why so        Many viewers of that host may watch one camera of this one. Its recorder fetches the stream once, and
 //               fills rings of its own with it. Who of its viewers may see and hear it, that host judges by the store
 //               that both have: a host that lies about it has the store, and could make itself a session.
+#include "standalone/api/forward_target.h"
 #include "standalone/api/own_apis.h"
 
 #include <algorithm>
@@ -82,10 +83,10 @@ class RingReader {
 
 // The process ends with its connection, and with a ring that is replaced: it leaves nothing that must be given back.
 std::string Live(const Call& call) {
-    if (!call.is_forwarded) {
-        throw Failure(403, "only another host of this installation may ask for this");
-    }
     const control::LiveStream stream{call.Parameter("camera").asInt(), call.Parameter("stream").asInt()};
+    if (HostOfCamera(call.Records(), stream.camera) != call.context.Installation().HostId()) {
+        throw Failure(503, "the camera has moved to another host", http::kRetrySoonSeconds);
+    }
     ShmStreamFifo* const video = binding::AttachLiveRing(stream);
     ShmStreamFifo* const sound = video == nullptr ? nullptr : LiveAdoStreamFifoAt(stream.camera, stream.stream);
     if (sound == nullptr) {

@@ -166,8 +166,8 @@ std::string Serve(const Service& service, http::Request& request, control::SlotT
                                own->Find(call.version, call.method).audience == Method::Audience::kManagers;
     if (needs_session) {
         Admit(call, service.limits);
-    } else if (own == &kHostApi && call.is_forwarded) {
-        AdmitOtherHost(slots, slot, service.limits);
+    } else if (own == &kHostApi) {
+        AdmitHost(slots, slot, RequireHost(call), service.limits);
     }
     if (IsPictureUpload(call)) {
         ForgetCookies(request, call);
@@ -256,7 +256,7 @@ void ServeRequest(const Service& service, http::Request& request, control::SlotT
     };
     events.on_paired_host = [&service, &slots, &slot](const std::string& secret) {
         slot.pairing = store::PairingId(secret);
-        AdmitOtherHost(slots, slot, service.limits);
+        AdmitPairedHost(slots, slot, service.limits);
     };
     binding::RequestContext& context = binding::RequestContext::Current();
     context.Begin(service.installation, &output, std::move(events));

@@ -64,7 +64,9 @@ std::optional<int> CameraLeaseKeeper::OtherHolder(int camera) const {
         return std::nullopt;
     }
     const auto found = held_elsewhere_->find(camera);
-    return found == held_elsewhere_->end() ? 0 : found->second;
+    const bool is_elsewhere =
+        found != held_elsewhere_->end() && !held_.contains(camera);  // it may just have been taken
+    return is_elsewhere ? found->second : 0;
 }
 
 void CameraLeaseKeeper::NoteRecorded(std::set<int> cameras) {
@@ -77,6 +79,9 @@ void CameraLeaseKeeper::Work(store::Store& store) {
     store::Hosts hosts(store);
     const std::vector<store::Host> all = hosts.All();
     const std::vector<AssignedHost> watched = Observe(all);
+    store::CameraLeases leases(store);
+    const std::vector<store::CameraLease> cameras = leases.List();
+    NoteHolders(cameras);  // first: live views need it of a store that can only be read as well
     if (rows_.IsRefused()) {
         Publish({});
         return;
@@ -88,9 +93,6 @@ void CameraLeaseKeeper::Work(store::Store& store) {
                   .version = base::kVersion,
                   .room = room_,
                   .processors = static_cast<int>(std::thread::hardware_concurrency())});
-    store::CameraLeases leases(store);
-    const std::vector<store::CameraLease> cameras = leases.List();
-    NoteHolders(cameras);
     const Assignment assignment = Assign(own_, watched, cameras);
     std::set<int> held;
     for (const store::CameraLease& camera : cameras) {

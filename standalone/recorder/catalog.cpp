@@ -41,17 +41,14 @@ CameraPlan PlanOf(const store::Camera& camera, const std::map<int, store::Record
 
 std::map<int, OtherHost> OtherHosts(store::Store& store, int own) {
     std::map<int, OtherHost> others;
-    store::Hosts hosts(store);
-    const std::optional<store::Host> self = own == 0 ? std::nullopt : hosts.Find(own);
-    if (!self) {
+    if (own == 0) {
         return others;
     }
     const std::string key = store::Sessions(store).Key();
-    for (const store::Host& host : hosts.All()) {
+    for (const store::Host& host : store::Hosts(store).All()) {
         if (host.id != own) {
-            others.emplace(
-                host.id,
-                OtherHost{host.id, host.name, {host.address, host.port, host.certificate}, key, self->address});
+            others.emplace(host.id,
+                           OtherHost{host.id, host.name, {host.address, host.port, host.certificate}, key, own});
         }
     }
     return others;

@@ -54,7 +54,7 @@ class Connection : remote::AnswerSink {
           stop_(std::move(stop)) {
         remote::ForwardedRequest request;
         request.query = "api=VEXO.Host&version=1&method=Live";
-        request.headers = {remote::ForwardTokenLine(other.key, other.id, other.own_address, base::WallSeconds())};
+        request.headers = {remote::HostTokenLine(other.key, other.id, other.own_id, base::WallSeconds())};
         request.json =
             R"({"camera":)" + std::to_string(stream.camera) + R"(,"stream":)" + std::to_string(stream.stream) + "}";
         request.max_head_wait = kMaxHeadWait;
@@ -88,7 +88,7 @@ class Connection : remote::AnswerSink {
     bool Begin(const remote::AnswerHead& head) override {
         if (head.status != kOk) {
             failure_ = name_ +
-                       (head.status == kForbidden  ? " refuses: are the clocks more than five minutes apart?"
+                       (head.status == kForbidden  ? " refuses it: are the clocks more than five minutes apart?"
                         : head.status == kNotFound ? " knows no such request: it is of another version"
                                                    : " has no picture of it") +
                        " (status " + std::to_string(head.status) + ")";

@@ -19,10 +19,13 @@ struct OtherHost {
     int id = 0;
     std::string name;
     remote::Host host;
-    std::string key;          // the store's, by which forward tokens are made
-    std::string own_address;  // the client that the token names: this host
+    std::string key;  // the store's, by which the tokens of hosts are made
+    int own_id = 0;   // this host's
 
-    bool operator==(const OtherHost&) const = default;
+    // Whether a stream can go on: renaming a host does not interrupt it.
+    bool operator==(const OtherHost& other) const {
+        return id == other.id && host == other.host && key == other.key && own_id == other.own_id;
+    }
 };
 
 // As media::OpenSource, without credentials: blocks for ten seconds at most until the formats are known. Those of sound

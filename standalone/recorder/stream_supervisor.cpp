@@ -17,6 +17,8 @@ namespace {
 
 constexpr std::chrono::milliseconds kPollWhileEnding{20};
 constexpr int kOrphanSearchSeconds = 60;
+// Of other hosts' cameras, whose rings take memory beside those that this host records. The web API forwards others.
+constexpr int kMaxFetchedStreams = 32;
 constexpr std::int64_t kStandstillUs = 3'000'000;
 
 }  // namespace
@@ -97,9 +99,15 @@ void StreamSupervisor::Reconcile() {
     const std::vector<control::LiveStream> recorded = recordings_.NeededStreams();
     needed.insert(needed.end(), recorded.begin(), recorded.end());
     std::map<control::LiveStream, StreamPlan> plans;
+    auto fetched =
+        std::ranges::count_if(workers_, [](const auto& each) { return each.second->Plan().other_host.has_value(); });
     for (const control::LiveStream& stream : needed) {
         if (std::optional<StreamPlan> plan = PlanOf(*catalog, stream)) {
-            plans.emplace(stream, *std::move(plan));
+            const bool is_new = plan->other_host && !workers_.contains(stream);
+            if (!is_new || fetched < kMaxFetchedStreams) {
+                plans.emplace(stream, *std::move(plan));
+                fetched += is_new ? 1 : 0;
+            }
         } else {
             catalog_.Refresh();  // added a moment ago, perhaps
         }

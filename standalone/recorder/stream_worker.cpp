@@ -145,7 +145,11 @@ void StreamWorker::WriteRings(StreamRings& rings, const media::Packet& packet,
 void StreamWorker::WaitToTryAgain(StreamRings& rings, const std::stop_token& stop) {
     constexpr std::int64_t kHeartbeatUs = 1'000'000;
     const std::int64_t now_us = base::MonotonicMicros();
-    const std::chrono::microseconds wait = backoff_.DelayAfterFailure();
+    // A host that is back is to have the stream before its viewers are forwarded one by one.
+    constexpr std::chrono::seconds kMaxDelayOfHost{2};
+    const std::chrono::microseconds delay = backoff_.DelayAfterFailure();
+    const std::chrono::microseconds wait =
+        plan_.other_host ? std::min<std::chrono::microseconds>(delay, kMaxDelayOfHost) : delay;
     const std::int64_t end_us = now_us + wait.count();
     for (std::int64_t step_us = now_us; step_us < end_us;) {
         rings.Beat();

@@ -29,4 +29,13 @@ std::string ForwardTokenLine(std::string_view key, int to_host, std::string_view
 std::optional<std::string> ClientInForwardToken(std::string_view token, std::string_view key, int own_host,
                                                 std::int64_t now_s);
 
+// What proves that a host of the store asks in its own name, as a header: of the same format, with the host's id in
+// place of the client, but neither kind passes for the other.
+constexpr std::string_view kHostHeader = "X-Lookhaven-Host";
+constexpr const char* kHostHeaderInScgi = "HTTP_X_LOOKHAVEN_HOST";
+std::string HostTokenLine(std::string_view key, int to_host, int from_host, std::int64_t now_s);
+
+// The id of the host that asks. Nothing as in ClientInForwardToken.
+std::optional<int> HostInToken(std::string_view token, std::string_view key, int own_host, std::int64_t now_s);
+
 }  // namespace lookhaven::remote

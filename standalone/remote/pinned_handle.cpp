@@ -36,6 +36,8 @@ PinnedHandle::PinnedHandle(const Host& host, const std::string& query, const std
     Set(CURLOPT_HTTP_VERSION, static_cast<long>(CURL_HTTP_VERSION_1_1));
     Set(CURLOPT_PROTOCOLS_STR, "https");
     Set(CURLOPT_NOPROXY, "*");
+    Set(CURLOPT_NOSIGNAL, 1L);
+    Set(CURLOPT_QUICK_EXIT, 1L);  // does not wait for a resolver that hangs
     Set(CURLOPT_SSLVERSION, static_cast<long>(CURL_SSLVERSION_TLSv1_2));
     Set(CURLOPT_CAINFO_BLOB, &certificate);
     Set(CURLOPT_CAPATH, static_cast<const char*>(nullptr));

@@ -11,7 +11,7 @@ using namespace lookhaven;
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     test::streamed = fuzz::Text({data, size});
     try {
-        const auto source = recorder::OpenHostStream({1, "North", {}, std::string(64, '0'), "here"}, {3, 0}, {}, {});
+        const auto source = recorder::OpenHostStream({1, "North", {}, std::string(64, '0'), 2}, {3, 0}, {}, {});
         for (;;) {
             const media::Packet packet = source->Next();
             fuzz::Require(!packet.data.empty() && packet.data.size() <= base::kMaxFrameBytes);

@@ -41,7 +41,7 @@ std::string Read(const std::string& answer) {
     test::streamed = answer;
     std::string seen;
     try {
-        const auto source = recorder::OpenHostStream({1, "North", {}, std::string(64, '0'), "here"}, {3, 0}, {}, {});
+        const auto source = recorder::OpenHostStream({1, "North", {}, std::string(64, '0'), 2}, {3, 0}, {}, {});
         for (seen = source->Audio() ? "heard: " : "";;) {
             const media::Packet packet = source->Next();
             const std::int64_t age_us = base::MonotonicMicros() - packet.timestamp_us;

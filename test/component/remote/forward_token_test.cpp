@@ -57,6 +57,16 @@ TEST(ForwardToken, IsNoOtherKindOfTokenOfTheSameKey) {
     }
 }
 
+TEST(HostToken, NamesAHostAndIsNoForwardToken) {
+    const std::string token = HostTokenLine(kKey, 2, 3, kNow).substr(kHostHeader.size() + 2);
+    EXPECT_EQ(HostInToken(token, kKey, 2, kNow), 3);
+    EXPECT_EQ(HostInToken(token, kKey, 3, kNow), std::nullopt);
+    EXPECT_EQ(ClientInForwardToken(token, kKey, 2, kNow), std::nullopt);
+    EXPECT_EQ(HostInToken(MakeForwardToken(kKey, 2, "3", kNow), kKey, 2, kNow), std::nullopt);
+    EXPECT_EQ(HostInToken(HostTokenLine(kKey, 2, -3, kNow).substr(kHostHeader.size() + 2), kKey, 2, kNow),
+              std::nullopt);
+}
+
 TEST(ForwardToken, TimesThatAreNoneAreRefusedThoughTheKeyHasSignedThem) {
     for (const std::string said : {"", " ", "x 192.0.2.7 ", "-1 192.0.2.7 ", "+1700000000 192.0.2.7 ",
                                    "1700000000x 192.0.2.7 ", "99999999999999999999 192.0.2.7 ", "1700000000"}) {
