@@ -116,12 +116,7 @@ ForwardTarget TargetOf(const Call& call, int own_host) {
 // The hosts that may have a player that does not run here: the one whose stream of it this host forwards, else all
 // others. Those without a recorder come last: where the machine is off, asking it is slow.
 std::vector<store::Host> HostsToAsk(const Call& call, int own_host, int known_host) {
-    std::set<int> offline;
-    for (const maintenance::HostStatus& status : maintenance::ReadHostStatus(call.context.Installation())) {
-        if (status.state == maintenance::HostState::kOffline) {
-            offline.insert(status.host);
-        }
-    }
+    const std::set<int> offline = maintenance::OfflineHosts(call.context.Installation());
     std::vector<store::Host> hosts = store::Hosts(call.Records()).All();
     std::erase_if(
         hosts, [&](const store::Host& host) { return known_host != 0 ? host.id != known_host : host.id == own_host; });

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstring>
+#include <deque>
 #include <optional>
 #include <span>
 #include <stdexcept>
@@ -23,8 +24,8 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::seconds kMaxHeadWait{10};  // longer than that host waits for a picture
 constexpr std::chrono::milliseconds kStep{100};
-// Two clocks drift apart by some seconds a day: by less than one part in so many.
-constexpr std::int64_t kDriftParts = 5'000;
+// Of the times that the other host says, one every five seconds: half a minute of them.
+constexpr std::size_t kNotedClocks = 6;
 // No clock counts more microseconds.
 constexpr std::int64_t kMaxClockUs = std::int64_t{1} << 60;
 constexpr std::size_t kMaxBodyBytes = base::kMaxFrameBytes;
@@ -188,14 +189,14 @@ class HostStream : public media::Source {
         NoteClock(head.timestamp_us);
     }
 
-    // Being under way only adds to the difference of the clocks, so the smallest is the best estimate; it may grow as
-    // slowly as clocks drift.
+    // Being under way only adds to the difference of the clocks, so the smallest of the last ones is the best estimate.
+    // Older ones do not count: clocks drift, and that of a virtual machine stands still while it is moved.
     void NoteClock(std::int64_t sent_us) {
-        const std::int64_t now_us = base::MonotonicMicros();
-        const std::int64_t offset_us = now_us - Checked(sent_us);
-        const std::int64_t drift_us = (now_us - noted_us_) / kDriftParts;
-        offset_us_ = noted_us_ == 0 ? offset_us : std::min(offset_us, offset_us_ + drift_us);
-        noted_us_ = now_us;
+        offsets_us_.push_back(base::MonotonicMicros() - Checked(sent_us));
+        if (offsets_us_.size() > kNotedClocks) {
+            offsets_us_.pop_front();
+        }
+        offset_us_ = *std::ranges::min_element(offsets_us_);
     }
 
     // By this host's clock; never in the future.
@@ -219,8 +220,8 @@ class HostStream : public media::Source {
     std::span<const char> body_;
     std::optional<media::StreamFormat> video_;
     std::optional<media::StreamFormat> audio_;
-    std::int64_t offset_us_ = 0;  // this host's clock minus that one's …
-    std::int64_t noted_us_ = 0;   // … as noted then; 0: not yet
+    std::deque<std::int64_t> offsets_us_;  // this host's clock minus that one's, as noted last …
+    std::int64_t offset_us_ = 0;           // … and the smallest of them
     Connection connection_;
 };
 

@@ -59,6 +59,10 @@ TEST(HostStream, GivesFramesAndRefusesWhatIsNoStream) {
     const std::string video = Format("H264", 640, 480, 0, "sps");
     const std::string ended = "host North has ended the stream";
     const std::string format = "host North sent a format that is unknown here";
+    std::string clocks_later;
+    for (int clock = 0; clock < 6; ++clock) {
+        clocks_later += Message(kClock, "", 0, 0, -kHourUs);
+    }
     const struct {
         const char* name;
         std::string answer;
@@ -76,6 +80,7 @@ TEST(HostStream, GivesFramesAndRefusesWhatIsNoStream) {
          Message(kFormat, video.substr(sizeof(ring::MessageHead)), 0, 0, -kHourUs) + Message(kClock) +
              Message(kFrame, "one"),
          "onesps " + ended},
+        {"clock that stood still", video + clocks_later + Message(kFrame, "one", 0, 0, -kHourUs), "onesps " + ended},
         {"time of no clock", video + Message(kFrame, "one", 0, 0, 1LL << 62),
          "host North sent a time that no clock shows"},
         {"clock of no time", video + Message(kClock, "", 0, 0, std::numeric_limits<std::int64_t>::min() / 2),
