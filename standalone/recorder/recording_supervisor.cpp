@@ -53,7 +53,8 @@ RecordingSupervisor::RecordingSupervisor(const base::Installation& installation,
                             return (!camera_leases_ || base::WallSeconds() >= mark.end_s + kFootageElsewhereS) &&
                                    !IsHeldElsewhere(mark.camera_id) && FootageHasEnded(mark);
                         });
-                    }) {}
+                    }),
+      partitions_(installation.StoreUrl()) {}
 
 // The cameras that a pending mark needs footage of now, and until when.
 std::map<int, std::int64_t> RecordingSupervisor::MarkedCameras(const CatalogContents& catalog) const {
@@ -165,6 +166,7 @@ void RecordingSupervisor::DoEverySecond(const std::map<int, CameraSignal>& signa
         camera_leases_->Ask(RoomOf(states.mounts, recorded), received);
     }
     missed_marks_.Ask();
+    partitions_.Ask();
     states.cameras = camera_status_.Combine(std::move(recorded), signals);
     status_publisher_.Publish(std::move(states));
 }
@@ -201,6 +203,7 @@ void RecordingSupervisor::AddCounters(control::StreamCounters& counters) const {
 
 void RecordingSupervisor::RequestStop() {
     missed_marks_.RequestStop();
+    partitions_.RequestStop();
     if (camera_leases_) {
         camera_leases_->RequestStop();
     }
@@ -220,7 +223,7 @@ bool RecordingSupervisor::HasEnded() {
         rows_.RequestStop();
     }
     return rows_.HasEnded() && (!camera_leases_ || camera_leases_->HasEnded()) && missed_marks_.HasEnded() &&
-           status_publisher_.HasEnded() && mounts_.HasEnded();
+           partitions_.HasEnded() && status_publisher_.HasEnded() && mounts_.HasEnded();
 }
 
 // Whether no more rows will come, neither from this recorder nor from files that an earlier one left on a mount.

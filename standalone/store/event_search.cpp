@@ -6,8 +6,10 @@
 #include <utility>
 
 #include "standalone/store/connection.h"
+#include "standalone/store/each_camera.h"
 #include "standalone/store/event_row.h"
 #include "standalone/store/events.h"
+#include "standalone/store/months.h"
 #include "standalone/store/step_text.h"
 
 namespace lookhaven::store {
@@ -15,43 +17,6 @@ namespace lookhaven::store {
 namespace {
 
 constexpr int kRowsPerBatch = 10'000;
-
-// An array in PostgreSQL's text form.
-std::string ArrayText(const std::set<int>& ids) {
-    std::string text = "{";
-    for (const int id : ids) {
-        text += (text.size() > 1 ? "," : "") + std::to_string(id);
-    }
-    return text + "}";
-}
-
-// For PostgreSQL: the rows of each camera of an array that meet the condition.
-std::string EachCameraText(const std::string& condition, const std::string& order) {
-    return std::string("select ") + Mapping<Event>::kColumns +
-           " from unnest(cast(:cameras as integer[])) as asked (camera) cross join lateral"
-           " (select * from events where camera_id = asked.camera" +
-           condition + ") as found order by camera_id, " + order;
-}
-
-// The rows that meet the condition, camera by camera. Either engine looks each camera up by itself: that way it uses
-// the index (camera, start) for all of it, the order too, however many cameras are asked for. SQLite is asked once a
-// camera; PostgreSQL, to which a question is a message and an answer, once.
-template <typename... Parameter>
-void EachCamera(Connection& connection, soci::session& sql, const std::set<int>& camera_ids,
-                const std::string& condition, const std::string& order, const Events::Visitor& visit,
-                const Parameter&... parameters) {
-    if (!connection.IsSqlite()) {
-        const std::string cameras = ArrayText(camera_ids);
-        Query<Event>(sql, kOnce, EachCameraText(condition, order), cameras, parameters...).ForEach(visit);
-        return;
-    }
-    int camera = 0;
-    Query<Event> rows(sql, kRepeatedly, "where camera_id = :camera" + condition, camera, parameters...);
-    for (const int id : camera_ids) {
-        camera = id;
-        rows.ForEach(visit);
-    }
-}
 
 // The filter's rows, camera by camera.
 void Search(Connection& connection, soci::session& sql, const EventFilter& filter, std::int64_t limit,
@@ -64,8 +29,8 @@ void Search(Connection& connection, soci::session& sql, const EventFilter& filte
         " and :reason in (0, reason) and (:finished = 0 or recording = 0)" +
         // As the condition of an index: kept events are few.
         std::string(filter.kept_only ? " and archived = 1" : "") + " order by " + order + " limit :limit";
-    EachCamera(connection, sql, filter.camera_ids, condition, order, visit, earliest, filter.end_s, filter.begin_s,
-               filter.mount_id, filter.reason, filter.finished_only, limit);
+    ForEachCamera<Event>(connection, sql, filter.camera_ids, condition, order, visit, earliest, filter.end_s,
+                         filter.begin_s, filter.mount_id, filter.reason, filter.finished_only, limit);
 }
 
 // With the reason in it as a number: that of kOthers is the condition of an index.
@@ -79,7 +44,7 @@ std::string ReasonText(Reasons reasons) {
 }  // namespace
 
 std::optional<Event> Events::Find(int id) {
-    return connection_.FetchOne<Event>("where id = :id", id);
+    return FindById<Event>(connection_, id, "");
 }
 
 std::vector<Event> Events::List(const EventFilter& filter) {
@@ -111,7 +76,7 @@ std::optional<Event> Events::Next(const Step& step, Reasons reasons) {
         BehindText(step) + " and demo = 0" + ReasonText(reasons) + " order by " + order + " limit 1";
     std::optional<Event> next;
     connection_.Read([&](soci::session& sql) {
-        EachCamera(
+        ForEachCamera<Event>(
             connection_, sql, step.camera_ids, condition, order,
             [&](const Event& event) {
                 if (!next || step.IsNearer(event, *next)) {

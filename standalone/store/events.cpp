@@ -133,8 +133,8 @@ bool Events::Finish(int id, std::int64_t end_s, int frame_count, std::int64_t si
         RequireSpan(*start_s, end_s);
         return Execute(sql,
                        "update events set end_s = :end, frame_count = :frames, size_bytes = :size, recording = 0"
-                       " where id = :id",
-                       end_s, frame_count, size_bytes, id) > 0;
+                       " where id = :id and start_s = :start",
+                       end_s, frame_count, size_bytes, id, *start_s) > 0;
     });
 }
 

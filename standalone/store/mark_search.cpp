@@ -84,11 +84,7 @@ std::string LikePatternsOf(const TextQuery& words) {
 }
 
 std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, std::int64_t earliest_s) {
-    std::string cameras;
-    for (const int camera : filter.camera_ids) {
-        cameras += (cameras.empty() ? "{" : ",") + std::to_string(camera);
-    }
-    cameras += '}';
+    const std::string cameras = ArrayText(filter.camera_ids);
     std::string words;
     for (const TextQuery::Phrase& phrase : filter.words.Phrases()) {
         words += (words.empty() ? "'" : " & '") + phrase.typed + '\'';

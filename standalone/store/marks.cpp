@@ -6,7 +6,9 @@
 #include <utility>
 
 #include "standalone/store/connection.h"
+#include "standalone/store/each_camera.h"
 #include "standalone/store/mark_row.h"
+#include "standalone/store/months.h"
 #include "standalone/store/step_text.h"
 #include "standalone/store/text.h"
 
@@ -59,14 +61,8 @@ void RequireWithin(soci::session& sql, std::int64_t max_per_day, const Reporter&
     }
 }
 
-std::vector<Mark> OfCamera(soci::session& sql, const MarkFilter& filter, int camera, std::int64_t limit) {
-    const std::int64_t earliest = std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds;
-    return FetchAll<Mark>(
-        sql,
-        "where camera_id = :camera and start_s >= :earliest and start_s < :end and end_s > :begin"
-        " and :kind in (0, kind) order by " +
-            std::string(filter.newest_first ? "start_s desc, id desc" : "start_s, id") + " limit :limit",
-        camera, earliest, filter.end_s, filter.begin_s, filter.kind ? static_cast<int>(*filter.kind) : 0, limit);
+int NumberOf(std::optional<MarkKind> kind) {
+    return kind ? static_cast<int>(*kind) : 0;
 }
 
 }  // namespace
@@ -133,7 +129,7 @@ bool Marks::Remove(int id) {
 }
 
 std::optional<Mark> Marks::Find(MarkKind kind, int id) {
-    return connection_.FetchOne<Mark>("where id = :id and kind = :kind", id, kind);
+    return FindById<Mark>(connection_, id, "and kind = :kind", kind);
 }
 
 std::vector<Mark> Marks::List(const MarkFilter& filter) {
@@ -142,12 +138,16 @@ std::vector<Mark> Marks::List(const MarkFilter& filter) {
     }
     const auto offset = static_cast<std::size_t>(std::max(filter.offset, 0));
     const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
+    const std::int64_t earliest = std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds;
+    const std::string order = filter.newest_first ? "start_s desc, id desc" : "start_s, id";
     std::vector<Mark> marks;
     connection_.Read([&](soci::session& sql) {
-        for (const int camera : filter.camera_ids) {
-            std::ranges::move(OfCamera(sql, filter, camera, static_cast<std::int64_t>(offset + limit)),
-                              std::back_inserter(marks));
-        }
+        ForEachCamera<Mark>(
+            connection_, sql, filter.camera_ids,
+            " and start_s >= :earliest and start_s < :end and end_s > :begin and :kind in (0, kind) order by " + order +
+                " limit :limit",
+            order, [&marks](const Mark& mark) { marks.push_back(mark); }, earliest, filter.end_s, filter.begin_s,
+            NumberOf(filter.kind), static_cast<std::int64_t>(offset + limit));
     });
     const auto key = [](const Mark& mark) { return std::pair(mark.start_s, mark.id); };
     filter.newest_first ? std::ranges::sort(marks, std::greater{}, key) : std::ranges::sort(marks, {}, key);
@@ -157,18 +157,19 @@ std::vector<Mark> Marks::List(const MarkFilter& filter) {
 }
 
 std::optional<Mark> Marks::Next(const Step& step, std::optional<MarkKind> kind) {
-    const std::string text = "where camera_id = :camera" + BehindText(step) +
-                             " and state = 1 and demo = 0 and :kind in (0, kind) order by " + OrderText(step) +
-                             " limit 1";
+    const std::string order = OrderText(step);
     std::optional<Mark> next;
     connection_.Read([&](soci::session& sql) {
-        for (const int camera : step.camera_ids) {
-            auto mark = FetchOne<Mark>(sql, text, camera, step.start_s, step.start_s, step.id,
-                                       kind ? static_cast<int>(*kind) : 0);
-            if (mark && (!next || step.IsNearer(*mark, *next))) {
-                next = std::move(mark);
-            }
-        }
+        ForEachCamera<Mark>(
+            connection_, sql, step.camera_ids,
+            BehindText(step) + " and state = 1 and demo = 0 and :kind in (0, kind) order by " + order + " limit 1",
+            order,
+            [&](const Mark& mark) {
+                if (!next || step.IsNearer(mark, *next)) {
+                    next = mark;
+                }
+            },
+            step.start_s, step.start_s, step.id, NumberOf(kind));
     });
     return next;
 }

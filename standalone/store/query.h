@@ -10,6 +10,7 @@
 #pragma once
 
 #include <optional>
+#include <set>
 #include <string>
 #include <tuple>
 #include <type_traits>
@@ -145,6 +146,9 @@ template <typename... Parameter>
 bool Exists(soci::session& sql, const std::string& text, const Parameter&... parameters) {
     return FetchOne<int>(sql, text, parameters...).has_value();
 }
+
+// An array in PostgreSQL's text form.
+std::string ArrayText(const std::set<int>& numbers);
 
 // "insert into <table> (a, b) values (:a, :b)" and "update <table> set b = :b where a = :a".
 std::string InsertText(const std::string& table, const std::string& columns);

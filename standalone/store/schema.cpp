@@ -2,6 +2,7 @@
 #include "standalone/store/schema.h"
 
 #include "standalone/store/mark_words_schema.h"
+#include "standalone/store/month_partitions_schema.h"
 
 namespace lookhaven::store {
 
@@ -303,6 +304,10 @@ constexpr Migration kMigrations[] = {
     {.purpose = "the maximum age of a camera's recordings", .statements = kMaxAgesOfCameras, .is_addition = true},
     {.purpose = "the load of hosts that share the store", .statements = kLoads, .is_addition = true},
     {.purpose = "mounts that hosts share", .statements = kSharedMounts, .is_addition = true},
+    {.purpose = "partitions by month",
+     .statements = {},
+     .on_postgresql = kMonthPartitionsOnPostgresql,
+     .is_addition = true},
 };
 
 }  // namespace

@@ -18,8 +18,8 @@ struct Migration {
     // What follows on one engine alone: nothing in it holds a record that is nowhere else.
     std::span<const char* const> on_sqlite = {};
     std::span<const char* const> on_postgresql = {};
-    // It only adds tables, or columns with a default, or changes indexes: programs that do not know it go on using the
-    // store.
+    // It only adds tables, or columns with a default, or changes indexes or partitions: programs that do not know it go on
+    // using the store.
     bool is_addition = false;
 };
 

@@ -1,0 +1,74 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// How PostgreSQL comes to divide events and marks by the month: a step of the schema (schema.cpp) that
+// month_partitions.cpp relies on.
+#pragma once
+
+namespace lookhaven::store {
+
+// What there is becomes one partition, "…_earlier", up to the next month: it is neither copied nor is its index made
+// anew, but for that of the key, which takes a second for a million rows. What is dated later goes to "…_other", the
+// default partition, which has what no other takes. An empty table becomes none.
+//
+// The key of a partitioned table holds what divides it, so ids alone are no key any more: that they are unique is for
+// the counter that they come from to see to. Nothing can refer to them, so a trigger removes a kept event's note.
+inline constexpr const char* kMonthPartitionsOnPostgresql[] = {
+    "create table event_months (start_s bigint not null primary key, first_id integer not null)",
+    "alter table kept_events drop constraint kept_events_event_id_fkey",
+    R"(do $do$
+declare
+    divided text;
+    own_index text;
+    following bigint := extract(epoch from date_trunc('month', now() at time zone 'UTC') + interval '1 month');
+    has_rows boolean;
+begin
+    foreach divided in array array['events', 'marks'] loop
+        execute format('alter table %I rename to %I', divided, divided || '_earlier');
+        execute format('alter table %I drop constraint %I', divided || '_earlier', divided || '_pkey');
+        for own_index in select indexname from pg_indexes
+            where schemaname = current_schema() and tablename = divided || '_earlier' loop
+            execute format('alter index %I rename to %I', own_index, own_index || '_earlier');
+        end loop;
+        execute format('create table %I (like %I including defaults) partition by range (start_s)', divided,
+                       divided || '_earlier');
+        execute format('create table %I partition of %I default', divided || '_other', divided);
+        execute format('select exists (select from %I)', divided || '_earlier') into has_rows;
+        if has_rows then
+            execute format('insert into %I select * from %I where start_s >= $1', divided, divided || '_earlier')
+                using following;
+            execute format('delete from %I where start_s >= $1', divided || '_earlier') using following;
+            execute format('alter table %I attach partition %I for values from (minvalue) to (%s)', divided,
+                           divided || '_earlier', following);
+        else
+            execute format('drop table %I', divided || '_earlier');
+        end if;
+    end loop;
+end $do$)",
+    "alter table events add primary key (id, start_s)",
+    "create index events_by_start on events (camera_id, start_s)",
+    "create index events_by_mount on events (mount_id, camera_id, id)",
+    ("create index events_by_order on events (mount_id, recording_order, id, size_bytes)"
+     " where recording = 0 and archived = 0 and demo = 0"),
+    ("create index events_of_camera_by_order on events (camera_id, mount_id, recording_order, id)"
+     " where recording = 0 and archived = 0 and demo = 0"),
+    "create index events_by_alarm on events (camera_id, start_s) where reason <> 1",
+    "create index events_kept on events (camera_id, start_s) where archived = 1",
+    "create index events_archived on events (mount_id) where archived = 1",
+    "create index events_open on events (id) where recording = 1",
+    "create index events_demo on events (id) where demo = 1",
+    "alter table marks add primary key (id, start_s)",
+    "create index marks_by_start on marks (camera_id, start_s)",
+    "create index marks_by_time on marks (start_s, id)",
+    "create index marks_by_mount on marks (mount_id, id)",
+    "create index marks_by_words_and_camera on marks using gin (mark_words(text), (array[camera_id]))",
+    "create index marks_by_reporter on marks (reporter_id, reported_s) where reporter_id <> 0",
+    "create index marks_pending on marks (end_s) where state = 0",
+    "create index marks_pending_by_reporter on marks (reporter_id, reported_s) where state = 0 and reporter_id <> 0",
+    "create index marks_demo on marks (id) where demo = 1",
+    R"(create function forget_kept_event() returns trigger language plpgsql as
+    $forget$ begin delete from kept_events where event_id = old.id; return null; end $forget$)",
+    ("create trigger kept_event_removed after delete on events for each row when (old.archived = 1)"
+     " execute function forget_kept_event()"),
+};
+
+}  // namespace lookhaven::store

@@ -1,0 +1,159 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Events and marks by the month in PostgreSQL: how an earlier store comes to that, and what is made, moved and dropped.
+#include "standalone/store/month_partitions.h"
+
+#include <algorithm>
+
+#include "standalone/base/clock.h"
+#include "standalone/store/copy.h"
+#include "standalone/store/events.h"
+#include "standalone/store/kept_events.h"
+#include "standalone/store/marks.h"
+#include "standalone/store/schema.h"
+#include "test/component/store/store_fixture.h"
+
+namespace lookhaven::store {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::Not;
+
+constexpr std::int64_t kOld = 1'577'880'000;  // 2020-01-01
+constexpr std::int64_t kFuture = 4'000'000'000;
+
+class MonthPartitionsTest : public EmptyStore {
+  protected:
+    static Event EventAt(std::int64_t start_s) {
+        Event event;
+        event.camera_id = 5;
+        event.mount_id = 1;
+        event.start_s = start_s;
+        event.end_s = start_s + 10;
+        return event;
+    }
+
+    std::string PartitionOf(const std::string& table, int id) {
+        return Ask("select cast(tableoid as regclass) || '' from " + table + " where id = " + std::to_string(id));
+    }
+
+    std::string Partitions() {
+        return Ask("select coalesce(string_agg(relname, ' ' order by relname), '') from pg_inherits join pg_class"
+                   " on pg_class.oid = inhrelid where relkind = 'r'");
+    }
+
+    // The name that "<table>_" is followed by in this month's partition.
+    std::string ThisMonth() { return Ask("select to_char(now() at time zone 'UTC', 'YYYY_MM')"); }
+};
+
+TEST_P(MonthPartitionsTest, AnEarlierStoreKeepsItsRowsWhereTheyAre) {
+    int version = 0;
+    for (const Migration& migration : Migrations()) {
+        if (migration.purpose == "partitions by month") {
+            break;
+        }
+        for (const auto& statements : {migration.statements, migration.on_postgresql}) {
+            std::ranges::for_each(statements, [this](const char* statement) { Force(statement); });
+        }
+        ++version;
+    }
+    Force("create table schema_version (version integer not null)");
+    Force("insert into schema_version (version) values (" + std::to_string(version) + ")");
+    const std::int64_t now_s = base::WallSeconds();
+    int id = 0;
+    for (const std::int64_t start_s : {kOld, now_s, kFuture}) {
+        const std::string times = std::to_string(start_s) + ", " + std::to_string(start_s + 10);
+        Force("insert into events values (" + std::to_string(++id) + ", 5, 1, " + times +
+              ", 0, 1, 0, 0, 3, '', 0, 0, 'x', 1, 0, 9)");
+        Force("insert into marks values (" + std::to_string(id + 10) + ", 1, 5, " + std::to_string(start_s) + ", " +
+              times + ", 'Total', 1, 1, 'x', 0)");
+        Force("insert into kept_events values (" + std::to_string(id) + ", 'note', '', 0)");
+    }
+    EXPECT_EQ(Store::Migrate(url_), Store::SchemaVersion() - version);
+    Store store = Store::Open(url_);
+    MaintainPartitions(store);
+    for (const auto& [event, mark, part] :
+         {std::tuple(1, 11, "_earlier"), std::tuple(2, 12, "_earlier"), std::tuple(3, 13, "_other")}) {
+        EXPECT_EQ(Events(store).Find(event)->order, 9);
+        EXPECT_EQ(KeptEvents(store).Find(event)->note, "note");
+        EXPECT_EQ(PartitionOf("events", event), std::string("events") + part);
+        EXPECT_EQ(Marks(store).Find(MarkKind::kAlert, mark)->text, "Total");
+        EXPECT_EQ(PartitionOf("marks", mark), std::string("marks") + part);
+    }
+    EXPECT_EQ(Marks(store).List({.camera_ids = {5}, .words = TextQuery("total")}).size(), 3);
+    EXPECT_EQ(Ask("select count(*) || '' from pg_index join pg_class on pg_class.oid = indexrelid"
+                  " where relname like '%\\_earlier' and not exists"
+                  " (select from pg_inherits where inhrelid = indexrelid)"),
+              "0")
+        << "an index that was there is used, and no second one made";
+    Events(store).Remove(std::vector{1});
+    EXPECT_EQ(KeptEvents(store).Find(1), std::nullopt);
+}
+
+TEST_P(MonthPartitionsTest, AreMadeForWhatIsRecordedAndDroppedOnceTheyAreEmpty) {
+    Store::Migrate(url_);
+    Store store = Store::Open(url_);
+    Events events(store);
+    EXPECT_EQ(Partitions(), "events_other marks_other") << "recording need not wait for the others";
+    const std::int64_t now_s = base::WallSeconds();
+    events.AddAll(std::vector{EventAt(kOld), EventAt(now_s), EventAt(kFuture)});
+    KeptEvents(store).Keep(std::vector{1}, {"note", "", 0});
+    Cameras(store).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
+    const int mark = Marks(store).Add(MarkKind::kAlert, 1, kOld + 86'400 * 70, 0, "claimed").id;
+    InParallel(3, [&] {
+        Store other = Store::Open(url_);
+        MaintainPartitions(other);
+        MaintainPartitions(other);
+    });
+    const std::string made = Partitions();
+    EXPECT_EQ(std::ranges::count(made, ' '), 6) << made;
+    EXPECT_EQ(PartitionOf("events", 1), "events_2020_01");
+    EXPECT_EQ(PartitionOf("events", 2), "events_" + ThisMonth());
+    EXPECT_EQ(PartitionOf("events", 3), "events_other");
+    EXPECT_EQ(PartitionOf("marks", mark), "marks_other");
+    EXPECT_EQ(KeptEvents(store).Find(1)->note, "note") << "moving an event is not removing it";
+    EXPECT_EQ(events.Find(1)->start_s, kOld);
+    EXPECT_EQ(Marks(store).Find(MarkKind::kAlert, mark)->text, "claimed");
+    EXPECT_THROW(events.Begin(With(EventAt(now_s), &Event::id, 1)), AlreadyExists) << "of another month";
+    events.Remove(std::vector{1, 2});
+    EXPECT_EQ(KeptEvents(store).Find(1), std::nullopt);
+    MaintainPartitions(store);
+    EXPECT_THAT(Partitions(), Not(HasSubstr("2020_01")));
+    EXPECT_THAT(Partitions(), HasSubstr("events_" + ThisMonth())) << "there will be more this month";
+}
+
+TEST_P(MonthPartitionsTest, AnIdIsFoundWhereverTheMonthOfItsNumberLeads) {
+    Store::Migrate(url_);
+    Store store = Store::Open(url_);
+    Events events(store);
+    MaintainPartitions(store);
+    Force("delete from event_months");
+    Force("insert into event_months values (" + std::to_string(kOld) + ", 3), (" + std::to_string(kFuture) + ", 6)");
+    for (const std::int64_t start_s :
+         {std::int64_t{5}, kOld + 5, kOld + 5, kFuture - 5, kFuture + 5, kFuture + 5, kOld + 5}) {
+        events.AddAll(std::vector{EventAt(start_s)});
+    }
+    for (int id = 1; id <= 7; ++id) {
+        ASSERT_TRUE(events.Find(id)) << id;
+        EXPECT_EQ(events.Find(id)->id, id);
+    }
+    EXPECT_EQ(events.Find(8), std::nullopt);
+}
+
+TEST_P(MonthPartitionsTest, ACopyHasThemFromTheBeginning) {
+    Store::Migrate(url_);
+    Store store = Store::Open(url_);
+    Events(store).AddAll(std::vector{EventAt(kOld), EventAt(kFuture)});
+    const std::string from = std::exchange(url_, NewUrl(Engine::kPostgresql, ""));
+    Store::Migrate(url_);
+    Store copy = Store::Open(url_);
+    CopyRecords(store, copy, CopySessions::kNo);
+    EXPECT_EQ(PartitionOf("events", 1), "events_2020_01");
+    EXPECT_EQ(PartitionOf("events", 2), "events_other");
+}
+
+INSTANTIATE_TEST_SUITE_P(, MonthPartitionsTest, testing::Values(Engine::kPostgresql), EngineName);
+
+}  // namespace
+}  // namespace lookhaven::store
