@@ -21,6 +21,7 @@
 #include "standalone/recorder/camera_lease_keeper.h"
 #include "standalone/recorder/catalog.h"
 #include "standalone/recorder/event_row_queue.h"
+#include "standalone/recorder/partition_upkeep.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
@@ -44,7 +45,8 @@ struct Camera {
 class Recorder {
   public:
     Recorder(const base::Installation& installation, int first, int count, int event_s, int mark_s)
-        : rows_(installation.StoreUrl(), store::RecorderName(installation), installation.HostId()),
+        : partitions_(installation.StoreUrl()),
+          rows_(installation.StoreUrl(), store::RecorderName(installation), installation.HostId()),
           camera_leases_(installation, rows_, kOfflineUs),
           catalog_(installation.StoreUrl(), installation.HostId(), [] {}),
           store_(store::Store::Open(installation.StoreUrl())),
@@ -70,6 +72,7 @@ class Recorder {
                 received[camera.id] = static_cast<std::uint64_t>(now_s * kBytesPerSecond);
             }
         }
+        partitions_.Ask();
         rows_.Refresh(cameras_.size());
         camera_leases_.NoteRecorded(std::move(recorded));
         camera_leases_.Ask(store::HostRoom::kFree, received);
@@ -128,6 +131,7 @@ class Recorder {
                 .path = archive::PathOf({camera, now_s, id, archive::FileKind::kRecording})};
     }
 
+    recorder::PartitionUpkeep partitions_;
     recorder::EventRowQueue rows_;
     recorder::CameraLeaseKeeper camera_leases_;
     recorder::Catalog catalog_;

@@ -18,18 +18,21 @@ namespace {
 
 constexpr int kRowsPerBatch = 10'000;
 
-// The filter's rows, camera by camera.
-void Search(Connection& connection, soci::session& sql, const EventFilter& filter, std::int64_t limit,
+// Nothing starts before it and still reaches the filter's span.
+Span StartsOf(const EventFilter& filter) {
+    return {std::max(filter.begin_s, base::kMaxRecordingSeconds) - base::kMaxRecordingSeconds, filter.end_s};
+}
+
+// The filter's rows that start then, camera by camera.
+void Search(Connection& connection, soci::session& sql, const EventFilter& filter, Span starts, std::int64_t limit,
             const Events::Visitor& visit) {
-    // Nothing starts before this and still reaches the span.
-    const std::int64_t earliest = std::max(filter.begin_s, base::kMaxRecordingSeconds) - base::kMaxRecordingSeconds;
     const std::string order = filter.newest_first ? "start_s desc, id desc" : "start_s, id";
     const std::string condition =
-        " and start_s >= :earliest and start_s < :end and end_s > :begin and :mount in (0, mount_id)"
+        " and start_s >= :from and start_s < :until and end_s > :begin and :mount in (0, mount_id)"
         " and :reason in (0, reason) and (:finished = 0 or recording = 0)" +
         // As the condition of an index: kept events are few.
         std::string(filter.kept_only ? " and archived = 1" : "") + " order by " + order + " limit :limit";
-    ForEachCamera<Event>(connection, sql, filter.camera_ids, condition, order, visit, earliest, filter.end_s,
+    ForEachCamera<Event>(connection, sql, filter.camera_ids, condition, order, visit, starts.from_s, starts.until_s,
                          filter.begin_s, filter.mount_id, filter.reason, filter.finished_only, limit);
 }
 
@@ -52,8 +55,12 @@ std::vector<Event> Events::List(const EventFilter& filter) {
     const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
     std::vector<Event> events;
     connection_.Read([&](soci::session& sql) {
-        Search(connection_, sql, filter, static_cast<std::int64_t>(offset + limit),
-               [&](const Event& event) { events.push_back(event); });
+        for (const Span starts : NearestFirst(connection_, StartsOf(filter), filter.newest_first)) {
+            if (events.size() < offset + limit) {
+                Search(connection_, sql, filter, starts, static_cast<std::int64_t>(offset + limit),
+                       [&](const Event& event) { events.push_back(event); });
+            }
+        }
     });
     const auto key = [](const Event& event) { return std::pair(event.start_s, event.id); };
     if (filter.camera_ids.size() > 1) {
@@ -66,7 +73,7 @@ std::vector<Event> Events::List(const EventFilter& filter) {
 
 void Events::Visit(const EventFilter& filter, const Visitor& visitor) {
     connection_.Read([&](soci::session& sql) {
-        Search(connection_, sql, filter, std::numeric_limits<std::int64_t>::max(), visitor);
+        Search(connection_, sql, filter, StartsOf(filter), std::numeric_limits<std::int64_t>::max(), visitor);
     });
 }
 
@@ -75,15 +82,18 @@ std::optional<Event> Events::Next(const Step& step, Reasons reasons) {
     const std::string condition =
         BehindText(step) + " and demo = 0" + ReasonText(reasons) + " order by " + order + " limit 1";
     std::optional<Event> next;
+    const auto take = [&](const Event& event) {
+        if (!next || step.IsNearer(event, *next)) {
+            next = event;
+        }
+    };
     connection_.Read([&](soci::session& sql) {
-        ForEachCamera<Event>(
-            connection_, sql, step.camera_ids, condition, order,
-            [&](const Event& event) {
-                if (!next || step.IsNearer(event, *next)) {
-                    next = event;
-                }
-            },
-            step.start_s, step.start_s, step.id);
+        for (const Span starts : NearestFirst(connection_, SpanOf(step), step.backwards)) {
+            if (!next) {
+                ForEachCamera<Event>(connection_, sql, step.camera_ids, condition, order, take, starts.from_s,
+                                     starts.until_s, step.start_s, step.id);
+            }
+        }
     });
     return next;
 }
@@ -249,8 +259,12 @@ std::optional<std::int64_t> Events::OldestOn(int mount_id) {
     return first.empty() ? std::nullopt : std::optional(first.front().start_s);
 }
 
-// Steps from camera to camera in the index instead of reading all of it.
+// In SQLite by steps from camera to camera in the index instead of reading all of it.
 std::set<int> Events::CamerasOn(int mount_id) {
+    if (!connection_.IsSqlite()) {
+        return connection_.FetchAll<int, std::set<int>>(
+            "select camera_id from event_places where :mount in (0, mount_id)", mount_id);
+    }
     const std::string from = mount_id == 0 ? " from events where 0 = " : " from events where mount_id = ";
     return connection_.FetchAll<int, std::set<int>>(
         "with recursive found (camera) as (select min(camera_id)" + from +

@@ -11,11 +11,13 @@
 //               letters of them all, which takes a quarter of the time to see.
 // See           mark_words_schema.h, which keeps both in step with the marks.
 #include <algorithm>
+#include <iterator>
 #include <sstream>
 #include <string>
 
 #include "standalone/store/connection.h"
 #include "standalone/store/mark_row.h"
+#include "standalone/store/months.h"
 
 namespace lookhaven::store {
 
@@ -83,7 +85,8 @@ std::string LikePatternsOf(const TextQuery& words) {
     return patterns;
 }
 
-std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, std::int64_t earliest_s) {
+// Those that start then, the first that many.
+std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, Span starts, std::int64_t limit) {
     const std::string cameras = ArrayText(filter.camera_ids);
     std::string words;
     for (const TextQuery::Phrase& phrase : filter.words.Phrases()) {
@@ -96,11 +99,11 @@ std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, std
         "where mark_words(text) @@ to_tsquery('simple', mark_small(:words))"
         " and cast(mark_small(text) like all (string_to_array(mark_small(:patterns), ' ')) as integer)"
         " <> 0 and array[camera_id] && cast(:cameras as integer[])"
-        " and camera_id = any (cast(:same_cameras as integer[])) and start_s >= :earliest"
-        " and start_s < :end and end_s > :begin and :kind in (0, kind)" +
+        " and camera_id = any (cast(:same_cameras as integer[])) and start_s >= :from"
+        " and start_s < :until and end_s > :begin and :kind in (0, kind)" +
             OrderOf(filter, "start_s", "id"),
-        words, patterns, cameras, cameras, earliest_s, filter.end_s, filter.begin_s,
-        filter.kind ? static_cast<int>(*filter.kind) : 0, filter.limit, filter.offset);
+        words, patterns, cameras, cameras, starts.from_s, starts.until_s, filter.begin_s,
+        filter.kind ? static_cast<int>(*filter.kind) : 0, limit, 0);
 }
 
 }  // namespace
@@ -111,7 +114,20 @@ std::vector<Mark> FindMarksByWords(Connection& connection, const MarkFilter& fil
     }
     const std::int64_t earliest_s = std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds;
     return connection.Read([&](soci::session& sql) {
-        return connection.IsSqlite() ? OnSqlite(sql, filter, earliest_s) : OnPostgresql(sql, filter, earliest_s);
+        if (connection.IsSqlite()) {
+            return OnSqlite(sql, filter, earliest_s);
+        }
+        const std::int64_t wanted = std::int64_t{filter.limit} + std::max(filter.offset, 0);
+        std::vector<Mark> found;
+        for (const Span starts : NearestFirst(connection, {earliest_s, filter.end_s}, filter.newest_first)) {
+            if (std::ssize(found) < wanted) {
+                std::ranges::move(OnPostgresql(sql, filter, starts, wanted - std::ssize(found)),
+                                  std::back_inserter(found));
+            }
+        }
+        found.erase(found.begin(),
+                    found.begin() + std::min<std::ptrdiff_t>(std::max(filter.offset, 0), std::ssize(found)));
+        return found;
     });
 }
 

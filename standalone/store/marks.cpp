@@ -138,16 +138,21 @@ std::vector<Mark> Marks::List(const MarkFilter& filter) {
     }
     const auto offset = static_cast<std::size_t>(std::max(filter.offset, 0));
     const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
-    const std::int64_t earliest = std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds;
+    const Span all{std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds, filter.end_s};
     const std::string order = filter.newest_first ? "start_s desc, id desc" : "start_s, id";
+    const std::string condition =
+        " and start_s >= :from and start_s < :until and end_s > :begin and :kind in (0, kind) order by " + order +
+        " limit :limit";
     std::vector<Mark> marks;
     connection_.Read([&](soci::session& sql) {
-        ForEachCamera<Mark>(
-            connection_, sql, filter.camera_ids,
-            " and start_s >= :earliest and start_s < :end and end_s > :begin and :kind in (0, kind) order by " + order +
-                " limit :limit",
-            order, [&marks](const Mark& mark) { marks.push_back(mark); }, earliest, filter.end_s, filter.begin_s,
-            NumberOf(filter.kind), static_cast<std::int64_t>(offset + limit));
+        for (const Span starts : NearestFirst(connection_, all, filter.newest_first)) {
+            if (marks.size() < offset + limit) {
+                ForEachCamera<Mark>(
+                    connection_, sql, filter.camera_ids, condition, order,
+                    [&marks](const Mark& mark) { marks.push_back(mark); }, starts.from_s, starts.until_s,
+                    filter.begin_s, NumberOf(filter.kind), static_cast<std::int64_t>(offset + limit));
+            }
+        }
     });
     const auto key = [](const Mark& mark) { return std::pair(mark.start_s, mark.id); };
     filter.newest_first ? std::ranges::sort(marks, std::greater{}, key) : std::ranges::sort(marks, {}, key);
@@ -158,18 +163,21 @@ std::vector<Mark> Marks::List(const MarkFilter& filter) {
 
 std::optional<Mark> Marks::Next(const Step& step, std::optional<MarkKind> kind) {
     const std::string order = OrderText(step);
+    const std::string condition =
+        BehindText(step) + " and state = 1 and demo = 0 and :kind in (0, kind) order by " + order + " limit 1";
     std::optional<Mark> next;
+    const auto take = [&](const Mark& mark) {
+        if (!next || step.IsNearer(mark, *next)) {
+            next = mark;
+        }
+    };
     connection_.Read([&](soci::session& sql) {
-        ForEachCamera<Mark>(
-            connection_, sql, step.camera_ids,
-            BehindText(step) + " and state = 1 and demo = 0 and :kind in (0, kind) order by " + order + " limit 1",
-            order,
-            [&](const Mark& mark) {
-                if (!next || step.IsNearer(mark, *next)) {
-                    next = mark;
-                }
-            },
-            step.start_s, step.start_s, step.id, NumberOf(kind));
+        for (const Span starts : NearestFirst(connection_, SpanOf(step), step.backwards)) {
+            if (!next) {
+                ForEachCamera<Mark>(connection_, sql, step.camera_ids, condition, order, take, starts.from_s,
+                                    starts.until_s, step.start_s, step.id, NumberOf(kind));
+            }
+        }
     });
     return next;
 }

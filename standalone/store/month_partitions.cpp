@@ -8,6 +8,7 @@
 #include <tuple>
 #include <vector>
 
+#include "standalone/base/clock.h"
 #include "standalone/store/months.h"
 
 namespace lookhaven::store {
@@ -152,22 +153,41 @@ void MaintainPartitions(Store& store) {
     for (const year_month month : wanted) {
         change([month](soci::session& sql) { MakePartitions(sql, month); });
     }
+    // Two that each removed what the other one still saw have left it.
+    change([](soci::session& sql) {
+        Execute(sql, "select forget_event_place(camera_id, mount_id) from event_places as place where not exists"
+                     " (select from events where camera_id = place.camera_id and mount_id = place.mount_id)");
+    });
     for (const char* table : kDivided) {
         change([&](soci::session& sql) { DropEmpty(sql, table, StartOf(this_month)); });
     }
 }
 
+std::vector<Span> NearestFirst(const Connection& connection, Span all, bool newest_first) {
+    constexpr std::int64_t kNearS = 31 * kDayS;
+    const std::int64_t border_s =
+        newest_first ? std::min(all.until_s, base::WallSeconds()) - kNearS : all.from_s + kNearS;
+    // From 1970 on is from the first month on, which may be any.
+    const bool is_open = !newest_first && all.from_s == 0;
+    if (connection.IsSqlite() || is_open || border_s <= all.from_s || border_s >= all.until_s) {
+        return {all};
+    }
+    const Span earlier{all.from_s, border_s};
+    const Span later{border_s, all.until_s};
+    return newest_first ? std::vector{later, earlier} : std::vector{earlier, later};
+}
+
 // A recorder takes ids some events in advance, so what begins a month may have one of the month before.
-std::optional<std::pair<std::int64_t, std::int64_t>> LikelySpan(soci::session& sql, int id) {
-    const auto span = FetchOne<std::pair<std::int64_t, std::int64_t>>(
-                          sql,
-                          "select coalesce((select max(start_s) from event_months where first_id <= :id), 0),"
-                          " coalesce((select min(start_s) from event_months where first_id > :same), :none)",
-                          id, id, kNoEnd - kDayS)
-                          .value();
-    return span == std::pair(std::int64_t{0}, kNoEnd - kDayS)
-               ? std::nullopt
-               : std::optional(std::pair(span.first, span.second + kDayS));
+std::optional<Span> LikelySpan(soci::session& sql, int id) {
+    const auto [from_s, until_s] =
+        FetchOne<std::pair<std::int64_t, std::int64_t>>(
+            sql,
+            "select coalesce((select max(start_s) from event_months where first_id <= :id), 0),"
+            " coalesce((select min(start_s) from event_months where first_id > :same), :none)",
+            id, id, kNoEnd - kDayS)
+            .value();
+    const Span span{from_s, until_s + kDayS};
+    return from_s == 0 && span.until_s == kNoEnd ? std::nullopt : std::optional(span);
 }
 
 }  // namespace lookhaven::store

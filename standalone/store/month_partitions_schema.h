@@ -14,6 +14,8 @@ namespace lookhaven::store {
 // the counter that they come from to see to. Nothing can refer to them, so a trigger removes a kept event's note.
 inline constexpr const char* kMonthPartitionsOnPostgresql[] = {
     "create table event_months (start_s bigint not null primary key, first_id integer not null)",
+    ("create table event_places (camera_id integer not null, mount_id integer not null,"
+     " primary key (mount_id, camera_id))"),
     "alter table kept_events drop constraint kept_events_event_id_fkey",
     R"(do $do$
 declare
@@ -65,10 +67,33 @@ end $do$)",
     "create index marks_pending on marks (end_s) where state = 0",
     "create index marks_pending_by_reporter on marks (reporter_id, reported_s) where state = 0 and reporter_id <> 0",
     "create index marks_demo on marks (id) where demo = 1",
-    R"(create function forget_kept_event() returns trigger language plpgsql as
-    $forget$ begin delete from kept_events where event_id = old.id; return null; end $forget$)",
-    ("create trigger kept_event_removed after delete on events for each row when (old.archived = 1)"
-     " execute function forget_kept_event()"),
+    "insert into event_places (camera_id, mount_id) select distinct camera_id, mount_id from events",
+    R"(create function event_added() returns trigger language plpgsql as $added$
+begin
+    perform 1 from event_places where camera_id = new.camera_id and mount_id = new.mount_id for key share;
+    if not found then
+        insert into event_places (camera_id, mount_id) values (new.camera_id, new.mount_id) on conflict do nothing;
+    end if;
+    return null;
+end $added$)",
+    "create trigger event_added after insert on events for each row execute function event_added()",
+    R"(create function forget_event_place(camera integer, mount integer) returns void language plpgsql as $forget$
+begin
+    perform 1 from event_places where camera_id = camera and mount_id = mount for update;
+    delete from event_places where camera_id = camera and mount_id = mount
+        and not exists (select from events where camera_id = camera and mount_id = mount);
+end $forget$)",
+    R"(create function event_removed() returns trigger language plpgsql as $removed$
+begin
+    if old.archived = 1 then
+        delete from kept_events where event_id = old.id;
+    end if;
+    if not exists (select from events where camera_id = old.camera_id and mount_id = old.mount_id) then
+        perform forget_event_place(old.camera_id, old.mount_id);
+    end if;
+    return null;
+end $removed$)",
+    "create trigger event_removed after delete on events for each row execute function event_removed()",
 };
 
 }  // namespace lookhaven::store

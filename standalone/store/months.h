@@ -8,7 +8,7 @@
 #include <optional>
 #include <set>
 #include <string>
-#include <utility>
+#include <vector>
 
 #include "standalone/store/connection.h"
 
@@ -21,8 +21,18 @@ std::set<std::chrono::year_month> PastMonths(soci::session& sql, const std::set<
 // of it. Inside Write on PostgreSQL only.
 void MakePartitions(soci::session& sql, std::chrono::year_month month);
 
-// Where what has the id most likely starts, up to and not including the second; nothing where that is not known.
-std::optional<std::pair<std::int64_t, std::int64_t>> LikelySpan(soci::session& sql, int id);
+// From the first second up to and not including the other one.
+struct Span {
+    std::int64_t from_s = 0;
+    std::int64_t until_s = 0;
+};
+
+// What an answer in the order of starts is read in, one span after the other until it is complete: for PostgreSQL the
+// days next to where it begins, in which most answers lie, and the rest; for SQLite the whole.
+std::vector<Span> NearestFirst(const Connection& connection, Span all, bool newest_first);
+
+// Where what has the id most likely starts; nothing where that is not known.
+std::optional<Span> LikelySpan(soci::session& sql, int id);
 
 // The event or mark with the id that meets the condition, which begins with "and", "" for none. It is looked for in the
 // month in which the id was given first: a request has to read what each partition is before it can look into it.
@@ -34,7 +44,7 @@ std::optional<Row> FindById(Connection& connection, int id, const std::string& c
         std::optional<Row> found;
         if (span) {
             found = FetchOne<Row>(sql, "where id = :id and start_s >= :from and start_s < :until " + condition, id,
-                                  span->first, span->second, parameters...);
+                                  span->from_s, span->until_s, parameters...);
         }
         return found ? found : FetchOne<Row>(sql, "where id = :id " + condition, id, parameters...);
     });

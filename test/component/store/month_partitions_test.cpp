@@ -4,6 +4,8 @@
 #include "standalone/store/month_partitions.h"
 
 #include <algorithm>
+#include <iterator>
+#include <limits>
 
 #include "standalone/base/clock.h"
 #include "standalone/store/copy.h"
@@ -22,6 +24,7 @@ using testing::Not;
 
 constexpr std::int64_t kOld = 1'577'880'000;  // 2020-01-01
 constexpr std::int64_t kFuture = 4'000'000'000;
+constexpr int kNoId = std::numeric_limits<int>::max();
 
 class MonthPartitionsTest : public EmptyStore {
   protected:
@@ -81,6 +84,7 @@ TEST_P(MonthPartitionsTest, AnEarlierStoreKeepsItsRowsWhereTheyAre) {
         EXPECT_EQ(Marks(store).Find(MarkKind::kAlert, mark)->text, "Total");
         EXPECT_EQ(PartitionOf("marks", mark), std::string("marks") + part);
     }
+    EXPECT_THAT(Events(store).CamerasOn(0), ElementsAre(5));
     EXPECT_EQ(Marks(store).List({.camera_ids = {5}, .words = TextQuery("total")}).size(), 3);
     EXPECT_EQ(Ask("select count(*) || '' from pg_index join pg_class on pg_class.oid = indexrelid"
                   " where relname like '%\\_earlier' and not exists"
@@ -118,7 +122,9 @@ TEST_P(MonthPartitionsTest, AreMadeForWhatIsRecordedAndDroppedOnceTheyAreEmpty) 
     EXPECT_THROW(events.Begin(With(EventAt(now_s), &Event::id, 1)), AlreadyExists) << "of another month";
     events.Remove(std::vector{1, 2});
     EXPECT_EQ(KeptEvents(store).Find(1), std::nullopt);
+    Force("insert into event_places (camera_id, mount_id) values (6, 1)");
     MaintainPartitions(store);
+    EXPECT_THAT(events.CamerasOn(1), ElementsAre(5)) << "what two removed at once is noticed";
     EXPECT_THAT(Partitions(), Not(HasSubstr("2020_01")));
     EXPECT_THAT(Partitions(), HasSubstr("events_" + ThisMonth())) << "there will be more this month";
 }
@@ -139,6 +145,66 @@ TEST_P(MonthPartitionsTest, AnIdIsFoundWhereverTheMonthOfItsNumberLeads) {
         EXPECT_EQ(events.Find(id)->id, id);
     }
     EXPECT_EQ(events.Find(8), std::nullopt);
+}
+
+// The days next to where an answer begins are read first, and the rest only where that is not enough.
+TEST_P(MonthPartitionsTest, WhatLiesMonthsApartIsReadInOrder) {
+    Store::Migrate(url_);
+    Store store = Store::Open(url_);
+    Cameras(store).Add({.name = "Gate", .profiles = {{.source = "test:mjpeg"}}});
+    const std::int64_t now_s = base::WallSeconds();
+    std::vector<std::int64_t> starts;
+    std::vector<Event> events;
+    std::vector<Mark> marks;
+    for (const int days : {-400, -100, -41, -40, -1, 0, 40, 200}) {
+        starts.push_back(now_s + days * 86'400);
+        events.push_back(With(EventAt(starts.back()), &Event::camera_id, days % 2 == 0 ? 1 : 2));
+        Mark mark;
+        mark.camera_id = events.back().camera_id;
+        mark.start_s = mark.moment_s = starts.back();
+        mark.end_s = mark.start_s + 10;
+        mark.text = "total";
+        mark.state = MarkState::kSaved;
+        marks.push_back(mark);
+    }
+    Events(store).AddAll(events);
+    Marks(store).AddAll(marks);
+    const auto starts_of = [](const auto& rows) {
+        std::vector<std::int64_t> found;
+        std::ranges::transform(rows, std::back_inserter(found), [](const auto& row) { return row.start_s; });
+        return found;
+    };
+    const int count = static_cast<int>(starts.size());
+    for (const bool newest_first : {false, true}) {
+        std::vector<std::int64_t> all = starts;
+        if (newest_first) {
+            std::ranges::reverse(all);
+        }
+        for (int offset = 0; offset <= count; ++offset) {
+            for (const int limit : {1, 3, count}) {
+                const std::vector<std::int64_t> expected(all.begin() + offset,
+                                                         all.begin() + std::min(offset + limit, count));
+                const auto lists = [&](auto filter) {
+                    filter.camera_ids = {1, 2};
+                    filter.newest_first = newest_first;
+                    filter.offset = offset;
+                    filter.limit = limit;
+                    filter.begin_s = starts.front();
+                    return filter;
+                };
+                EXPECT_EQ(starts_of(Events(store).List(lists(EventFilter()))), expected) << offset << ' ' << limit;
+                EXPECT_EQ(starts_of(Marks(store).List(lists(MarkFilter()))), expected) << offset << ' ' << limit;
+                MarkFilter words = lists(MarkFilter());
+                words.words = TextQuery("total");
+                EXPECT_EQ(starts_of(Marks(store).List(words)), expected) << offset << ' ' << limit;
+            }
+        }
+        for (int i = 0; i + 1 < count; ++i) {
+            const Step step{{1, 2}, all.at(i), newest_first ? 0 : kNoId, newest_first};
+            EXPECT_EQ(Events(store).Next(step, Reasons::kAny)->start_s, all.at(i + 1)) << i;
+            EXPECT_EQ(Marks(store).Next(step, std::nullopt)->start_s, all.at(i + 1)) << i;
+        }
+    }
 }
 
 TEST_P(MonthPartitionsTest, ACopyHasThemFromTheBeginning) {
