@@ -23,6 +23,7 @@ endforeach()
 find_library(SQLITE3 sqlite3 REQUIRED)
 target_link_libraries(lookhaven_soci INTERFACE ${SQLITE3})
 find_path(SOCI_INCLUDE soci/soci.h REQUIRED)
+find_path(LIBPQ_INCLUDE libpq-fe.h PATH_SUFFIXES postgresql REQUIRED)
 target_include_directories(lookhaven_soci SYSTEM INTERFACE ${SOCI_INCLUDE})
 if(LOOKHAVEN_SANITIZE MATCHES "undefined")
     # The library hides the type information that this check compares.

@@ -5,6 +5,7 @@
 #include <stdexcept>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include <malloc.h>
 #include <sys/stat.h>
@@ -27,14 +28,13 @@ static_assert(offsetof(DbgLogCfg, m_PidLevel) == offsetof(control::DebugLogConfi
 
 namespace {
 
-// Nothing for a store that is no file, or whose file is not there.
-std::optional<StoreFile> FileOf(const std::string& url) {
+StorePlace PlaceOf(const std::string& url) {
     constexpr std::string_view kSqlite = "sqlite:";
     struct stat file {};
-    if (!url.starts_with(kSqlite) || ::stat(url.c_str() + kSqlite.size(), &file) != 0) {
-        return std::nullopt;
+    if (url.starts_with(kSqlite) && ::stat(url.c_str() + kSqlite.size(), &file) == 0) {
+        return {url, file.st_dev, file.st_ino};
     }
-    return StoreFile{url, file.st_dev, file.st_ino};
+    return {url};
 }
 
 }  // namespace
@@ -46,23 +46,17 @@ RequestContext& RequestContext::Current() {
 }
 
 void RequestContext::OpenRecordsAhead(const base::Installation& installation) {
-    const std::optional<StoreFile> file = FileOf(installation.StoreUrl());
-    auto records = std::make_unique<store::Store>(store::Store::Open(installation.StoreUrl()));
+    StorePlace place = PlaceOf(installation.StoreUrl());
+    auto records = std::make_unique<store::Store>(store::Store::Open(place.url));
     // Records that do not exist: reading them warms up this process's memory.
     store::Users(*records).Find(0);
     store::Cameras(*records).Find(0);
-    // A connection to a server may be gone when it is needed.
-    if (file) {
-        records_ = std::move(records);
-        opened_ahead_ = file;
-    }
+    records_ = std::move(records);
+    opened_ahead_ = std::move(place);
 }
 
 void RequestContext::Begin(const base::Installation& installation, Output* output, RequestEvents events) {
     base::SetLogProgram("request");
-    if (opened_ahead_ && (opened_ahead_ != FileOf(installation.StoreUrl()) || !records_->IsUpToDate())) {
-        records_.reset();
-    }
     installation_ = installation;
     output_ = output;
     events_ = std::move(events);
@@ -80,6 +74,11 @@ const base::Installation& RequestContext::Installation() const {
 }
 
 store::Store& RequestContext::Records() {
+    if (const auto ahead = std::exchange(opened_ahead_, std::nullopt)) {
+        if (*ahead != PlaceOf(Installation().StoreUrl()) || !records_->IsUpToDate()) {
+            records_.reset();
+        }
+    }
     if (records_ == nullptr) {
         records_ = std::make_unique<store::Store>(store::Store::Open(Installation().StoreUrl()));
     }
@@ -134,6 +133,7 @@ const store::Mount* RequestContext::MountOf(int camera_id) {
 
 void RequestContext::CloseRecords() {
     cache_ = {};
+    opened_ahead_.reset();
     if (records_ != nullptr) {
         records_.reset();
         // What the store worked with is half of a viewer's own memory, and there may be hundreds of viewers.

@@ -70,13 +70,13 @@ struct RecordCache {
     std::optional<std::map<int, int>> hosts;  // of the store, by the camera that each records
 };
 
-// A file can be replaced by another one of the same name, as by restoring a backup.
-struct StoreFile {
+// Where a store is. A file can be replaced by another one of the same name, as by restoring a backup.
+struct StorePlace {
     std::string url;
-    dev_t device = 0;
+    dev_t device = 0;  // these two of a file that is there
     ino_t number = 0;
 
-    bool operator==(const StoreFile&) const = default;
+    bool operator==(const StorePlace&) const = default;
 };
 
 class LH_PLATFORM_API RequestContext {
@@ -88,9 +88,9 @@ class LH_PLATFORM_API RequestContext {
     RequestContext(const RequestContext&) = delete;
     RequestContext& operator=(const RequestContext&) = delete;
 
-    // In a process that waits for its request: opens the store if that is a file, and reads it once as requests do, so
-    // that their first read is fast. Begin closes it when the installation has another store, or the store another
-    // schema, by then. Throws store::StoreError.
+    // In a process that waits for its request: opens the store, and reads it once as requests do, so that their first
+    // read is fast. Records opens it anew when it is out of date by then: the installation has another store, or the
+    // store another schema, or the connection to its server is lost. Throws store::StoreError.
     void OpenRecordsAhead(const base::Installation& installation);
 
     // Borrows output for the rest of the process's life, null where nothing is sent.
@@ -103,7 +103,7 @@ class LH_PLATFORM_API RequestContext {
     SendQueue* Queue() const { return queue_; }
     void SetQueue(SendQueue* queue) { queue_ = queue; }
 
-    // The record store, opened by the first call. Throws store::StoreError.
+    // The record store, opened by the first call unless it was ahead. Throws store::StoreError.
     store::Store& Records();
     // What this request has read; empty after CloseRecords and for another caller.
     RecordCache& Cache() { return cache_; }
@@ -167,7 +167,7 @@ class LH_PLATFORM_API RequestContext {
     SendQueue* queue_ = nullptr;
     RequestEvents events_;
     std::unique_ptr<store::Store> records_;
-    std::optional<StoreFile> opened_ahead_;
+    std::optional<StorePlace> opened_ahead_;  // what records_ is, until it is known to be up to date
     RecordCache cache_;
     unsigned int caller_ = 0;
     std::string session_;

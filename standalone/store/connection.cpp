@@ -31,11 +31,12 @@ bool LiesOnFullDisk(const std::string& file) {
     return !file.empty() && std::filesystem::space(file, failure).available == 0 && !failure;
 }
 
-// A server that is unreachable or hangs must not hold up the recorder or a request for minutes. What the address
-// itself says about connecting goes first.
+// A server that is unreachable or hangs must not hold up the recorder or a request for minutes, and a firewall on the
+// way must not forget a connection that nothing uses for hours. What the address itself says about connecting goes
+// first.
 std::string WithTimeouts(std::string location) {
     const bool is_url = location.starts_with("postgresql://");
-    for (const std::string limit : {"connect_timeout=2", "tcp_user_timeout=5000"}) {
+    for (const std::string limit : {"connect_timeout=2", "tcp_user_timeout=5000", "keepalives_idle=60"}) {
         if (location.find(limit.substr(0, limit.find('=') + 1)) == std::string::npos) {
             location += !is_url ? " " : location.find('?') == std::string::npos ? "?" : "&";
             location += limit;

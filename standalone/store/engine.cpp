@@ -1,12 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/store/engine.h"
 
+#include <memory>
 #include <utility>
 
+#include <soci/postgresql/soci-postgresql.h>
 #include <soci/sqlite3/soci-sqlite3.h>
 #include <soci/version.h>
 
 #include <dlfcn.h>
+#include <poll.h>
 
 #include "standalone/store/connection.h"
 
@@ -29,20 +32,52 @@ void WarmUpSqlite() {
     sqlite_api::sqlite3_randomness(0, nullptr);  // else all processes would go on with the same numbers
 }
 
+[[noreturn]] void ThrowNoClient() {
+    throw StoreError(std::string("cannot load the client of PostgreSQL: ") + ::dlerror());
+}
+
+// A function of PostgreSQL's client, or of what that is linked with. Throws StoreError.
+template <typename Function>
+Function* FindFunction(const char* name) {
+    static void* const library = [] {
+        const std::string file = "libsoci_postgresql.so." + std::to_string(SOCI_VERSION / 100'000) + '.' +
+                                 std::to_string(SOCI_VERSION / 100 % 1'000);
+        void* opened = ::dlopen(file.c_str(), RTLD_NOW | RTLD_LOCAL);
+        if (opened == nullptr) {
+            ThrowNoClient();
+        }
+        return opened;
+    }();
+    void* found = ::dlsym(library, name);
+    if (found == nullptr) {
+        ThrowNoClient();
+    }
+    return reinterpret_cast<Function*>(found);
+}
+
 }  // namespace
 
 const soci::backend_factory& Postgresql() {
-    static const soci::backend_factory* const factory = [] {
-        const std::string name = "libsoci_postgresql.so." + std::to_string(SOCI_VERSION / 100'000) + '.' +
-                                 std::to_string(SOCI_VERSION / 100 % 1'000);
-        void* library = ::dlopen(name.c_str(), RTLD_NOW | RTLD_LOCAL);
-        void* get = library == nullptr ? nullptr : ::dlsym(library, "factory_postgresql");
-        if (get == nullptr) {
-            throw StoreError(std::string("cannot load the client of PostgreSQL: ") + ::dlerror());
-        }
-        return reinterpret_cast<const soci::backend_factory* (*)()>(get)();
-    }();
+    static const soci::backend_factory* const factory =
+        FindFunction<const soci::backend_factory*()>("factory_postgresql")();
     return *factory;
+}
+
+std::optional<std::string> AskWithin(std::chrono::milliseconds limit, soci::session& sql, const char* statement) {
+    PGconn* connection = static_cast<soci::postgresql_session_backend*>(sql.get_backend())->conn_;
+    if (FindFunction<decltype(PQsendQuery)>("PQsendQuery")(connection, statement) == 0) {
+        return std::nullopt;
+    }
+    pollfd socket{FindFunction<decltype(PQsocket)>("PQsocket")(connection), POLLIN, 0};
+    if (::poll(&socket, 1, static_cast<int>(limit.count())) != 1) {
+        return std::nullopt;
+    }
+    const std::unique_ptr<PGresult, decltype(PQclear)*> result(
+        FindFunction<decltype(PQgetResult)>("PQgetResult")(connection), FindFunction<decltype(PQclear)>("PQclear"));
+    if (FindFunction<decltype(PQntuples)>("PQntuples")(result.get()) == 0) {
+        return std::nullopt;
+    }
+    return FindFunction<decltype(PQgetvalue)>("PQgetvalue")(result.get(), 0, 0);
 }
 
 void PrepareEngine(const std::string& url) {

@@ -7,16 +7,24 @@
 //               each fork copies, so it is loaded only for a store of PostgreSQL.
 #pragma once
 
+#include <chrono>
+#include <optional>
 #include <string>
 
 namespace soci {
 class backend_factory;
-}
+class session;
+}  // namespace soci
 
 namespace lookhaven::store {
 
 // Loads the client of PostgreSQL for the rest of the process's life. Throws StoreError.
 const soci::backend_factory& Postgresql();
+
+// Of a session of PostgreSQL: the first value of the statement's answer. Nothing for an answer without rows, for a
+// failure, and where no answer begins within the limit, which the client's library does not have: close the session
+// then, since the answer may still come. Throws StoreError.
+std::optional<std::string> AskWithin(std::chrono::milliseconds limit, soci::session& sql, const char* statement);
 
 // For a process that forks those which open the store of that URL. Opens nothing that outlives the call. Throws
 // StoreError.

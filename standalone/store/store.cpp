@@ -14,6 +14,7 @@
 
 #include "standalone/base/file.h"
 #include "standalone/store/connection.h"
+#include "standalone/store/engine.h"
 #include "standalone/store/schema.h"
 #include "standalone/store/secret.h"
 #include "standalone/store/sessions.h"
@@ -26,6 +27,7 @@ constexpr std::size_t kInstallationIdBytes = 16;
 constexpr int kLogAttempts = 100;
 constexpr std::chrono::milliseconds kLogAttemptPause{50};
 constexpr std::chrono::minutes kAheadMaxAge{15};
+constexpr std::chrono::seconds kAnswerLimit{2};
 
 // 0 for a store without a schema.
 int ReadVersion(Connection& connection) {
@@ -67,8 +69,16 @@ int ReadVersionOfReady(Connection& connection) try {
     return ReadVersion(connection);
 }
 
-void CheckVersion(Connection& connection) {
-    const int version = ReadVersionOfReady(connection);
+// In one round trip to a server that may have been idle, lost, stopped or demoted since the last one.
+int ReadVersionOfIdle(Connection& connection) {
+    if (connection.IsSqlite()) {
+        return ReadVersionOfReady(connection);
+    }
+    const char* query = "select version from schema_version where current_setting('transaction_read_only') = 'off'";
+    return connection.Read([&](soci::session& sql) { return std::stoi(AskWithin(kAnswerLimit, sql, query).value()); });
+}
+
+void CheckVersion(Connection& connection, int version) {
     if (version > Store::SchemaVersion() && !IsCompatible(connection)) {
         ThrowNewer(version);
     }
@@ -204,7 +214,7 @@ Store Store::Open(const std::string& url) {
         throw SchemaError("there is no record store at " + address.location + ": run lookhaven init");
     }
     auto connection = std::make_unique<Connection>(address);
-    CheckVersion(*connection);
+    CheckVersion(*connection, ReadVersionOfReady(*connection));
     return Store(std::move(connection));
 }
 
@@ -213,7 +223,7 @@ bool Store::IsSqlite() const {
 }
 
 bool Store::IsUpToDate() try {
-    CheckVersion(*connection_);
+    CheckVersion(*connection_, ReadVersionOfIdle(*connection_));
     return true;
 } catch (const std::exception&) {
     return false;

@@ -93,7 +93,9 @@ class Store {
     // The schema version this program needs.
     static int SchemaVersion();
 
-    // Whether Open would take the store still. False also where it cannot be read.
+    // Whether Open would take the store still. False also where it cannot be read, where its server does not answer
+    // within two seconds, the time in which a new connection is made or refused, and where that server lets nothing be
+    // written: another one of its address may.
     bool IsUpToDate();
 
     Store(Store&&) noexcept;

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <array>
 #include <atomic>
+#include <csignal>
 #include <string>
 #include <thread>
 #include <vector>
@@ -20,6 +21,7 @@
 #include "standalone/store/users.h"
 #include "test/support/host/host_under_test.h"
 #include "test/support/host/scgi_bytes.h"
+#include "test/support/postgres/temporary_postgres.h"
 
 namespace lookhaven::api {
 
@@ -209,6 +211,25 @@ TEST_F(Admission, AStoreThatFailsIsNeverAnEmptyList) {
     base::WriteFileAtomically(host_.Home().Home() / "store", "postgresql:host=/nonexistent dbname=lookhaven\n");
     const host::Answer answer = host_.Ask(search, admin_);
     EXPECT_EQ(answer.status, 503) << answer.body << "may be tried again: a standby may take over";
+}
+
+TEST_F(Admission, AConnectionThatWasOpenedAheadAndIsLostCostsNoRequest) {
+    test::TemporaryPostgres server;
+    const std::string url = server.NewDatabase();
+    store::Store::Migrate(url);
+    store::Store records = store::Store::Open(url);
+    store::Users(records).Add("admin", "right password", store::Privilege::kOwner);
+    base::WriteFileAtomically(host_.Home().Home() / "store", url);
+    const std::string session = host_.LogIn().secret;
+    const auto spares = host_.SpareProcesses();
+    std::ranges::for_each(spares, [](pid_t spare) { ::kill(spare, SIGKILL); });
+    const std::string others = " from pg_stat_activity where datname = current_database() and pid <> pg_backend_pid()";
+    const auto count = [&] { return records.connection().FetchOne<int>("select count(*)" + others).value(); };
+    ASSERT_TRUE(host::Eventually(std::chrono::seconds(20), [&] { return count() == std::ssize(spares); }));
+    records.connection().FetchAll<std::string>("select pg_terminate_backend(pid)::text" + others);
+    for (std::size_t i = 0; i < spares.size(); ++i) {
+        EXPECT_EQ(host_.Ask("api=Test&version=1&method=Search", session).status, 200);
+    }
 }
 
 TEST_F(Admission, SlowsDownGuessingOfAnAddressOrAnIpv6Network) {

@@ -3,6 +3,7 @@
 // Opening and setting up a store: from nothing, again, by several at once, and with what this program must not touch.
 #include <algorithm>
 #include <atomic>
+#include <csignal>
 #include <fstream>
 
 #include <sys/stat.h>
@@ -249,8 +250,19 @@ TEST_P(StoreTest, ALostServerIsToldFromAFailingStore) {
     }
     EXPECT_NO_THROW(store_.connection().Read([](soci::session& sql) { sql << "select 1"; }));
     if (GetParam() == Engine::kPostgresql) {
+        const int server = store_.connection().FetchOne<int>("select pg_backend_pid()").value();
+        ::kill(server, SIGSTOP);
+        EXPECT_FALSE(store_.IsUpToDate()) << "it does not wait for a server that hangs";
+        ::kill(server, SIGCONT);
+        for (const bool can_write : {false, true}) {
+            store_.connection().Read([&](soci::session& sql) {
+                sql << std::string("set default_transaction_read_only = ") + (can_write ? "off" : "on");
+            });
+            EXPECT_EQ(store_.IsUpToDate(), can_write) << "it was demoted";
+        }
         const auto end = [](soci::session& sql) { sql << "select pg_terminate_backend(pg_backend_pid())"; };
         EXPECT_THROW(store_.connection().Read(end), StoreUnavailable);
+        EXPECT_FALSE(store_.IsUpToDate());
         EXPECT_THROW(Store::Open("postgresql:host=/nonexistent"), StoreUnavailable);
     }
 }
