@@ -73,6 +73,23 @@ class Postgres:
         self._run("createdb", *self._where(), name)
         return f"postgresql:host={self._folder} port={self.port} user=postgres dbname={name}"
 
+    def make_months(self, database, begin_s):
+        """Partitions from then on, as recorders would have made them."""
+        self.ask(database, f"""do $$
+declare
+    month timestamp;
+    divided text;
+begin
+    for month in select generate_series(date_trunc('month', to_timestamp({begin_s}) at time zone 'UTC'),
+                                        now() at time zone 'UTC', '1 month') loop
+        foreach divided in array array['events', 'marks'] loop
+            execute format('create table %I partition of %I for values from (%s) to (%s)',
+                           divided || to_char(month, '_YYYY_MM'), divided, cast(extract(epoch from month) as bigint),
+                           cast(extract(epoch from month + interval '1 month') as bigint));
+        end loop;
+    end loop;
+end $$""")
+
     def copy(self, database, table, columns, rows):
         text = "".join("\t".join(str(value) for value in row) + "\n" for row in rows)
         self._run("psql", "-q", *self._where(), "-d", database, "-c",

@@ -97,16 +97,19 @@ def bare_millis(database, day):
     return sorted(times)[len(times) // 2]
 
 
-def measure(bin_folder, size, store=None, plant=None):
+def measure(bin_folder, size, server=None):
     """What each question costs in a store of that size, and what the bare SQL does where there is one."""
     answers = {}
-    with Stand(bin_folder, store) as stand:
+    name = f"events_{size}"
+    with Stand(bin_folder, server and server.new_database(name)) as stand:
+        if server is not None:
+            server.make_months(name, OLD_MONTH)
         for number in range(CAMERAS):
             stand.add_test_camera(f"Camera {number + 1}", "test:mjpeg?size=1280x720&fps=25")
         stand.add_events(size, YEARS_DAYS)
         rows = planted_rows(10 * SIZES[-1])
-        if plant is not None:
-            plant(rows)
+        if server is not None:
+            server.copy(name, "events", COLUMNS, rows)
         else:
             with sqlite3.connect(stand.database) as connection:
                 marks = ", ".join("?" * len(COLUMNS))
@@ -115,9 +118,9 @@ def measure(bin_folder, size, store=None, plant=None):
         stand.start_host()
         stand.start_nginx()
         cookie = stand.log_in()
-        for name, query, day in questions():
+        for question, query, day in questions():
             p50, p99 = ask(bin_folder, stand, cookie, query)
-            answers[name] = (p50, p99, bare_millis(stand.database, day) if day and plant is None else None)
+            answers[question] = (p50, p99, bare_millis(stand.database, day) if day and server is None else None)
     return answers
 
 
@@ -136,14 +139,7 @@ def main():
     bin_folder = pathlib.Path(sys.argv[1])
     print_table("SQLite", *(measure(bin_folder, size) for size in SIZES))
     with Postgres() as server:
-        answers = []
-        for size in SIZES:
-            name = f"events_{size}"
-            address = server.new_database(name)
-            answers.append(
-                measure(bin_folder, size, address, lambda rows: server.copy(name, "events", COLUMNS, rows))
-            )
-        print_table("PostgreSQL", *answers)
+        print_table("PostgreSQL", *(measure(bin_folder, size, server) for size in SIZES))
 
 
 if __name__ == "__main__":

@@ -164,17 +164,23 @@ void MaintainPartitions(Store& store) {
 }
 
 std::vector<Span> NearestFirst(const Connection& connection, Span all, bool newest_first) {
-    constexpr std::int64_t kNearS = 31 * kDayS;
-    const std::int64_t border_s =
-        newest_first ? std::min(all.until_s, base::WallSeconds()) - kNearS : all.from_s + kNearS;
     // From 1970 on is from the first month on, which may be any.
-    const bool is_open = !newest_first && all.from_s == 0;
-    if (connection.IsSqlite() || is_open || border_s <= all.from_s || border_s >= all.until_s) {
+    if (connection.IsSqlite() || (!newest_first && all.from_s == 0)) {
         return {all};
     }
-    const Span earlier{all.from_s, border_s};
-    const Span later{border_s, all.until_s};
-    return newest_first ? std::vector{later, earlier} : std::vector{earlier, later};
+    std::vector<Span> spans;
+    const std::int64_t newest_s = std::clamp<std::int64_t>(all.until_s, 0, base::WallSeconds());
+    const std::int64_t oldest_s = std::min(all.from_s, base::WallSeconds());
+    for (const std::int64_t near_s : {31 * kDayS, 186 * kDayS}) {
+        const std::int64_t border_s = newest_first ? newest_s - near_s : oldest_s + near_s;
+        if (border_s <= all.from_s || border_s >= all.until_s) {
+            break;
+        }
+        spans.push_back(newest_first ? Span{border_s, all.until_s} : Span{all.from_s, border_s});
+        (newest_first ? all.until_s : all.from_s) = border_s;
+    }
+    spans.push_back(all);
+    return spans;
 }
 
 // A recorder takes ids some events in advance, so what begins a month may have one of the month before.

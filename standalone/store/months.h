@@ -28,7 +28,7 @@ struct Span {
 };
 
 // What an answer in the order of starts is read in, one span after the other until it is complete: for PostgreSQL the
-// days next to where it begins, in which most answers lie, and the rest; for SQLite the whole.
+// month next to where it begins, in which most answers lie, half a year, and the rest; for SQLite the whole.
 std::vector<Span> NearestFirst(const Connection& connection, Span all, bool newest_first);
 
 // Where what has the id most likely starts; nothing where that is not known.
