@@ -21,7 +21,7 @@
 #include "standalone/recorder/camera_lease_keeper.h"
 #include "standalone/recorder/catalog.h"
 #include "standalone/recorder/event_row_queue.h"
-#include "standalone/recorder/partition_upkeep.h"
+#include "standalone/recorder/partition_maintenance.h"
 #include "standalone/store/marks.h"
 #include "standalone/store/mounts.h"
 #include "standalone/store/recorder_lease.h"
@@ -131,7 +131,7 @@ class Recorder {
                 .path = archive::PathOf({camera, now_s, id, archive::FileKind::kRecording})};
     }
 
-    recorder::PartitionUpkeep partitions_;
+    recorder::PartitionMaintenance partitions_;
     recorder::EventRowQueue rows_;
     recorder::CameraLeaseKeeper camera_leases_;
     recorder::Catalog catalog_;

@@ -28,7 +28,7 @@ static_assert(offsetof(DbgLogCfg, m_PidLevel) == offsetof(control::DebugLogConfi
 
 namespace {
 
-StorePlace PlaceOf(const std::string& url) {
+StoreIdentity IdentityOf(const std::string& url) {
     constexpr std::string_view kSqlite = "sqlite:";
     struct stat file {};
     if (url.starts_with(kSqlite) && ::stat(url.c_str() + kSqlite.size(), &file) == 0) {
@@ -46,13 +46,13 @@ RequestContext& RequestContext::Current() {
 }
 
 void RequestContext::OpenRecordsAhead(const base::Installation& installation) {
-    StorePlace place = PlaceOf(installation.StoreUrl());
-    auto records = std::make_unique<store::Store>(store::Store::Open(place.url));
+    StoreIdentity identity = IdentityOf(installation.StoreUrl());
+    auto records = std::make_unique<store::Store>(store::Store::Open(identity.url));
     // Records that do not exist: reading them warms up this process's memory.
     store::Users(*records).Find(0);
     store::Cameras(*records).Find(0);
     records_ = std::move(records);
-    opened_ahead_ = std::move(place);
+    opened_ahead_ = std::move(identity);
 }
 
 void RequestContext::Begin(const base::Installation& installation, Output* output, RequestEvents events) {
@@ -75,7 +75,7 @@ const base::Installation& RequestContext::Installation() const {
 
 store::Store& RequestContext::Records() {
     if (const auto ahead = std::exchange(opened_ahead_, std::nullopt)) {
-        if (*ahead != PlaceOf(Installation().StoreUrl()) || !records_->IsUpToDate()) {
+        if (*ahead != IdentityOf(Installation().StoreUrl()) || !records_->IsUpToDate()) {
             records_.reset();
         }
     }

@@ -70,13 +70,13 @@ struct RecordCache {
     std::optional<std::map<int, int>> hosts;  // of the store, by the camera that each records
 };
 
-// Where a store is. A file can be replaced by another one of the same name, as by restoring a backup.
-struct StorePlace {
+// Tells one store from another: a file can be replaced by one of the same name, as by restoring a backup.
+struct StoreIdentity {
     std::string url;
-    dev_t device = 0;  // these two of a file that is there
-    ino_t number = 0;
+    dev_t device = 0;  // these two are 0 for a server, and for a file that is not there
+    ino_t inode = 0;
 
-    bool operator==(const StorePlace&) const = default;
+    bool operator==(const StoreIdentity&) const = default;
 };
 
 class LH_PLATFORM_API RequestContext {
@@ -103,7 +103,7 @@ class LH_PLATFORM_API RequestContext {
     SendQueue* Queue() const { return queue_; }
     void SetQueue(SendQueue* queue) { queue_ = queue; }
 
-    // The record store, opened by the first call unless it was ahead. Throws store::StoreError.
+    // The record store, opened by the first call, or checked by it where OpenRecordsAhead has opened it. Throws store::StoreError.
     store::Store& Records();
     // What this request has read; empty after CloseRecords and for another caller.
     RecordCache& Cache() { return cache_; }
@@ -167,7 +167,7 @@ class LH_PLATFORM_API RequestContext {
     SendQueue* queue_ = nullptr;
     RequestEvents events_;
     std::unique_ptr<store::Store> records_;
-    std::optional<StorePlace> opened_ahead_;  // what records_ is, until it is known to be up to date
+    std::optional<StoreIdentity> opened_ahead_;  // what records_ is, until it is known to be up to date
     RecordCache cache_;
     unsigned int caller_ = 0;
     std::string session_;

@@ -20,7 +20,7 @@
 #include "standalone/recorder/camera_lease_keeper.h"
 #include "standalone/recorder/camera_status_tracker.h"
 #include "standalone/recorder/mount_supervisor.h"
-#include "standalone/recorder/partition_upkeep.h"
+#include "standalone/recorder/partition_maintenance.h"
 #include "standalone/recorder/recording_worker.h"
 #include "standalone/recorder/start_attempts.h"
 #include "standalone/recorder/status_publisher.h"
@@ -82,7 +82,7 @@ class RecordingSupervisor {
     StartAttempts starts_;
     std::map<int, Entry> entries_;
     StoreThread missed_marks_;
-    PartitionUpkeep partitions_;
+    PartitionMaintenance partitions_;
     bool stores_last_rows_ = false;
 };
 

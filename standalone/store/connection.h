@@ -166,7 +166,7 @@ void RequireFreeName(soci::session& sql, const std::string& table, const std::st
 // Tells those who poll Settings::Revision() that cameras or settings changed. Inside Write only.
 void RaiseRevision(soci::session& sql);
 
-// Locks out concurrent migrations. Inside Write only.
+// Locks out concurrent migrations, and work on partitions. Inside Write only.
 void LockSchema(Connection& connection, soci::session& sql);
 
 }  // namespace lookhaven::store

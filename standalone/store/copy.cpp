@@ -13,7 +13,7 @@
 #include <vector>
 
 #include "standalone/store/connection.h"
-#include "standalone/store/months.h"
+#include "standalone/store/month_partitions.h"
 #include "standalone/store/schema.h"
 
 namespace lookhaven::store {
@@ -179,18 +179,6 @@ void RequireKnown(soci::session& sql) {
     }
 }
 
-// Else all of it would go to the default partition, and be moved out of that later.
-void MakePartitionsFor(soci::session& from, Connection& target, soci::session& to) {
-    if (target.IsSqlite()) {
-        return;
-    }
-    const auto days =
-        FetchAll<std::int64_t, std::set<std::int64_t>>(from, "select distinct start_s / 86400 from events");
-    for (const std::chrono::year_month month : PastMonths(to, days)) {
-        MakePartitions(to, month);
-    }
-}
-
 void LiftTimeLimit(Connection& connection, soci::session& sql) {
     if (!connection.IsSqlite()) {
         sql << "set local statement_timeout = 0";
@@ -241,7 +229,11 @@ std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions, Co
             for (auto table = tables.rbegin(); table != tables.rend(); ++table) {
                 Execute(to, "delete from " + *table);
             }
-            MakePartitionsFor(from, target.connection(), to);
+            if (!target.connection().IsSqlite()) {
+                // Else all would go to the default partition, and be moved out of that later.
+                MakePartitionsFor(to, EventsByDay(from, "events"));
+                Execute(to, "delete from event_months");
+            }
             std::int64_t rows = 0;
             for (const std::string& table : tables) {
                 rows += CopyTable(source.connection(), from, to, table);

@@ -9,6 +9,7 @@
 #include <soci/version.h>
 
 #include <dlfcn.h>
+#include <libpq-fe.h>
 #include <poll.h>
 
 #include "standalone/store/connection.h"
@@ -36,7 +37,7 @@ void WarmUpSqlite() {
     throw StoreError(std::string("cannot load the client of PostgreSQL: ") + ::dlerror());
 }
 
-// A function of PostgreSQL's client, or of what that is linked with. Throws StoreError.
+// A function of SOCI's part for PostgreSQL, or of libpq, with which that is linked. Throws StoreError.
 template <typename Function>
 Function* FindFunction(const char* name) {
     static void* const library = [] {
@@ -63,21 +64,40 @@ const soci::backend_factory& Postgresql() {
     return *factory;
 }
 
-std::optional<std::string> AskWithin(std::chrono::milliseconds limit, soci::session& sql, const char* statement) {
+std::optional<std::string> AskWithin(soci::session& sql, const char* statement, std::chrono::milliseconds limit) {
+    using Clock = std::chrono::steady_clock;
+    using Result = std::unique_ptr<PGresult, decltype(PQclear)*>;
+    auto* const is_busy = FindFunction<decltype(PQisBusy)>("PQisBusy");
+    auto* const consume = FindFunction<decltype(PQconsumeInput)>("PQconsumeInput");
+    auto* const get = FindFunction<decltype(PQgetResult)>("PQgetResult");
+    auto* const clear = FindFunction<decltype(PQclear)>("PQclear");
     PGconn* connection = static_cast<soci::postgresql_session_backend*>(sql.get_backend())->conn_;
     if (FindFunction<decltype(PQsendQuery)>("PQsendQuery")(connection, statement) == 0) {
         return std::nullopt;
     }
+    const Clock::time_point deadline = Clock::now() + limit;
     pollfd socket{FindFunction<decltype(PQsocket)>("PQsocket")(connection), POLLIN, 0};
-    if (::poll(&socket, 1, static_cast<int>(limit.count())) != 1) {
-        return std::nullopt;
+    const auto arrives = [&] {
+        while (is_busy(connection) != 0) {
+            const auto left = std::chrono::ceil<std::chrono::milliseconds>(deadline - Clock::now());
+            if (left.count() <= 0 || ::poll(&socket, 1, static_cast<int>(left.count())) != 1 ||
+                consume(connection) == 0) {
+                return false;
+            }
+        }
+        return true;
+    };
+    std::optional<std::string> value;
+    while (arrives()) {
+        const Result result(get(connection), clear);
+        if (result == nullptr) {
+            return value;  // only now does the connection take another statement
+        }
+        if (!value && FindFunction<decltype(PQntuples)>("PQntuples")(result.get()) > 0) {
+            value = FindFunction<decltype(PQgetvalue)>("PQgetvalue")(result.get(), 0, 0);
+        }
     }
-    const std::unique_ptr<PGresult, decltype(PQclear)*> result(
-        FindFunction<decltype(PQgetResult)>("PQgetResult")(connection), FindFunction<decltype(PQclear)>("PQclear"));
-    if (FindFunction<decltype(PQntuples)>("PQntuples")(result.get()) == 0) {
-        return std::nullopt;
-    }
-    return FindFunction<decltype(PQgetvalue)>("PQgetvalue")(result.get(), 0, 0);
+    return std::nullopt;
 }
 
 void PrepareEngine(const std::string& url) {

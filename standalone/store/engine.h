@@ -21,10 +21,10 @@ namespace lookhaven::store {
 // Loads the client of PostgreSQL for the rest of the process's life. Throws StoreError.
 const soci::backend_factory& Postgresql();
 
-// Of a session of PostgreSQL: the first value of the statement's answer. Nothing for an answer without rows, for a
-// failure, and where no answer begins within the limit, which the client's library does not have: close the session
-// then, since the answer may still come. Throws StoreError.
-std::optional<std::string> AskWithin(std::chrono::milliseconds limit, soci::session& sql, const char* statement);
+// Of a session of PostgreSQL: the first value of the statement's answer; nothing for an answer without rows, and for a
+// failure. libpq has no time limit for answers: nothing either where it is not complete within this one. Close the
+// session then, since the rest may still come. Throws StoreError.
+std::optional<std::string> AskWithin(soci::session& sql, const char* statement, std::chrono::milliseconds limit);
 
 // For a process that forks those which open the store of that URL. Opens nothing that outlives the call. Throws
 // StoreError.

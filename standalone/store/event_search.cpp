@@ -6,11 +6,9 @@
 #include <utility>
 
 #include "standalone/store/connection.h"
-#include "standalone/store/each_camera.h"
 #include "standalone/store/event_row.h"
 #include "standalone/store/events.h"
-#include "standalone/store/months.h"
-#include "standalone/store/step_text.h"
+#include "standalone/store/row_search.h"
 
 namespace lookhaven::store {
 
@@ -19,21 +17,19 @@ namespace {
 constexpr int kRowsPerBatch = 10'000;
 
 // Nothing starts before it and still reaches the filter's span.
-Span StartsOf(const EventFilter& filter) {
+StartSpan StartsOf(const EventFilter& filter) {
     return {std::max(filter.begin_s, base::kMaxRecordingSeconds) - base::kMaxRecordingSeconds, filter.end_s};
 }
 
 // The filter's rows that start then, camera by camera.
-void Search(Connection& connection, soci::session& sql, const EventFilter& filter, Span starts, std::int64_t limit,
+void Search(Connection& connection, soci::session& sql, const EventFilter& filter, StartSpan starts, std::int64_t limit,
             const Events::Visitor& visit) {
-    const std::string order = filter.newest_first ? "start_s desc, id desc" : "start_s, id";
-    const std::string condition =
-        " and start_s >= :from and start_s < :until and end_s > :begin and :mount in (0, mount_id)"
-        " and :reason in (0, reason) and (:finished = 0 or recording = 0)" +
-        // As the condition of an index: kept events are few.
-        std::string(filter.kept_only ? " and archived = 1" : "") + " order by " + order + " limit :limit";
-    ForEachCamera<Event>(connection, sql, filter.camera_ids, condition, order, visit, starts.from_s, starts.until_s,
-                         filter.begin_s, filter.mount_id, filter.reason, filter.finished_only, limit);
+    const std::string condition = " and end_s > :reached and :mount in (0, mount_id) and :reason in (0, reason)"
+                                  " and (:finished = 0 or recording = 0)" +
+                                  // As the condition of an index: kept events are few.
+                                  std::string(filter.kept_only ? " and archived = 1" : "");
+    ForEachCamera<Event>(connection, sql, filter.camera_ids, starts, filter.newest_first, limit, visit, condition,
+                         filter.begin_s, filter.mount_id, filter.reason, filter.finished_only);
 }
 
 // With the reason in it as a number: that of kOthers is the condition of an index.
@@ -55,11 +51,12 @@ std::vector<Event> Events::List(const EventFilter& filter) {
     const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
     std::vector<Event> events;
     connection_.Read([&](soci::session& sql) {
-        for (const Span starts : NearestFirst(connection_, StartsOf(filter), filter.newest_first)) {
-            if (events.size() < offset + limit) {
-                Search(connection_, sql, filter, starts, static_cast<std::int64_t>(offset + limit),
-                       [&](const Event& event) { events.push_back(event); });
+        for (const StartSpan starts : NearestFirst(connection_, StartsOf(filter), filter.newest_first)) {
+            if (events.size() >= offset + limit) {
+                break;
             }
+            Search(connection_, sql, filter, starts, static_cast<std::int64_t>(offset + limit),
+                   [&](const Event& event) { events.push_back(event); });
         }
     });
     const auto key = [](const Event& event) { return std::pair(event.start_s, event.id); };
@@ -78,24 +75,7 @@ void Events::Visit(const EventFilter& filter, const Visitor& visitor) {
 }
 
 std::optional<Event> Events::Next(const Step& step, Reasons reasons) {
-    const std::string order = OrderText(step);
-    const std::string condition =
-        BehindText(step) + " and demo = 0" + ReasonText(reasons) + " order by " + order + " limit 1";
-    std::optional<Event> next;
-    const auto take = [&](const Event& event) {
-        if (!next || step.IsNearer(event, *next)) {
-            next = event;
-        }
-    };
-    connection_.Read([&](soci::session& sql) {
-        for (const Span starts : NearestFirst(connection_, SpanOf(step), step.backwards)) {
-            if (!next) {
-                ForEachCamera<Event>(connection_, sql, step.camera_ids, condition, order, take, starts.from_s,
-                                     starts.until_s, step.start_s, step.id);
-            }
-        }
-    });
-    return next;
+    return NextRow<Event>(connection_, step, " and demo = 0" + ReasonText(reasons));
 }
 
 std::vector<Event> Events::Open() {
@@ -263,7 +243,7 @@ std::optional<std::int64_t> Events::OldestOn(int mount_id) {
 std::set<int> Events::CamerasOn(int mount_id) {
     if (!connection_.IsSqlite()) {
         return connection_.FetchAll<int, std::set<int>>(
-            "select camera_id from event_places where :mount in (0, mount_id)", mount_id);
+            "select camera_id from event_cameras where :mount in (0, mount_id)", mount_id);
     }
     const std::string from = mount_id == 0 ? " from events where 0 = " : " from events where mount_id = ";
     return connection_.FetchAll<int, std::set<int>>(

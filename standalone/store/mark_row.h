@@ -3,11 +3,14 @@
 // How marks are stored, and how they are searched for words. For this folder's sources.
 #pragma once
 
+#include <algorithm>
+#include <optional>
 #include <vector>
 
 #include "standalone/store/marks.h"
 #include "standalone/store/query.h"
 #include "standalone/store/recording_plans.h"
+#include "standalone/store/row_search.h"
 
 namespace lookhaven::store {
 
@@ -27,7 +30,15 @@ struct Mapping<Mark> {
 constexpr std::int64_t kMaxFootageSeconds = kMaxMarkSeconds + 2 * kMaxAroundMarkSeconds;
 constexpr std::int64_t kLastMoment = std::numeric_limits<int>::max();  // clients count in 31 bits
 
-class Connection;
+// 0 for any.
+inline int NumberOf(std::optional<MarkKind> kind) {
+    return kind ? static_cast<int>(*kind) : 0;
+}
+
+// Nothing starts before it and still reaches the filter's span.
+inline StartSpan StartsOf(const MarkFilter& filter) {
+    return {std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds, filter.end_s};
+}
 
 // Marks::List for a filter with words.
 std::vector<Mark> FindMarksByWords(Connection& connection, const MarkFilter& filter);

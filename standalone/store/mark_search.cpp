@@ -17,13 +17,13 @@
 
 #include "standalone/store/connection.h"
 #include "standalone/store/mark_row.h"
-#include "standalone/store/months.h"
 
 namespace lookhaven::store {
 
 namespace {
 
 constexpr std::int64_t kIdMask = 0xFFFF'FFFF;
+constexpr int kMaxReadOffset = 1'000;  // what is left out is read only as far as this
 
 // What is quoted is words and has no other meaning; a phrase holds no quotes.
 std::string ExpressionOf(const MarkFilter& filter) {
@@ -85,8 +85,9 @@ std::string LikePatternsOf(const TextQuery& words) {
     return patterns;
 }
 
-// Those that start then, the first that many.
-std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, Span starts, std::int64_t limit) {
+// Those that start then.
+std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, StartSpan starts, std::int64_t limit,
+                               std::int64_t offset) {
     const std::string cameras = ArrayText(filter.camera_ids);
     std::string words;
     for (const TextQuery::Phrase& phrase : filter.words.Phrases()) {
@@ -102,8 +103,8 @@ std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, Spa
         " and camera_id = any (cast(:same_cameras as integer[])) and start_s >= :from"
         " and start_s < :until and end_s > :begin and :kind in (0, kind)" +
             OrderOf(filter, "start_s", "id"),
-        words, patterns, cameras, cameras, starts.from_s, starts.until_s, filter.begin_s,
-        filter.kind ? static_cast<int>(*filter.kind) : 0, limit, 0);
+        words, patterns, cameras, cameras, starts.begin_s, starts.end_s, filter.begin_s, NumberOf(filter.kind), limit,
+        offset);
 }
 
 }  // namespace
@@ -112,21 +113,24 @@ std::vector<Mark> FindMarksByWords(Connection& connection, const MarkFilter& fil
     if (filter.camera_ids.empty() || filter.limit <= 0) {
         return {};
     }
-    const std::int64_t earliest_s = std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds;
     return connection.Read([&](soci::session& sql) {
         if (connection.IsSqlite()) {
-            return OnSqlite(sql, filter, earliest_s);
+            return OnSqlite(sql, filter, StartsOf(filter).begin_s);
         }
-        const std::int64_t wanted = std::int64_t{filter.limit} + std::max(filter.offset, 0);
+        if (filter.offset > kMaxReadOffset) {
+            return OnPostgresql(sql, filter, StartsOf(filter), filter.limit, filter.offset);
+        }
+        const std::int64_t offset = std::max(filter.offset, 0);
+        const std::int64_t wanted = filter.limit + offset;
         std::vector<Mark> found;
-        for (const Span starts : NearestFirst(connection, {earliest_s, filter.end_s}, filter.newest_first)) {
-            if (std::ssize(found) < wanted) {
-                std::ranges::move(OnPostgresql(sql, filter, starts, wanted - std::ssize(found)),
-                                  std::back_inserter(found));
+        for (const StartSpan starts : NearestFirst(connection, StartsOf(filter), filter.newest_first)) {
+            if (std::ssize(found) == wanted) {
+                break;
             }
+            std::ranges::move(OnPostgresql(sql, filter, starts, wanted - std::ssize(found), 0),
+                              std::back_inserter(found));
         }
-        found.erase(found.begin(),
-                    found.begin() + std::min<std::ptrdiff_t>(std::max(filter.offset, 0), std::ssize(found)));
+        found.erase(found.begin(), found.begin() + std::min<std::ptrdiff_t>(offset, std::ssize(found)));
         return found;
     });
 }

@@ -6,10 +6,8 @@
 #include <utility>
 
 #include "standalone/store/connection.h"
-#include "standalone/store/each_camera.h"
 #include "standalone/store/mark_row.h"
-#include "standalone/store/months.h"
-#include "standalone/store/step_text.h"
+#include "standalone/store/row_search.h"
 #include "standalone/store/text.h"
 
 namespace lookhaven::store {
@@ -59,10 +57,6 @@ void RequireWithin(soci::session& sql, std::int64_t max_per_day, const Reporter&
     if (reported.value() >= max_per_day) {
         throw TooManyMarks();
     }
-}
-
-int NumberOf(std::optional<MarkKind> kind) {
-    return kind ? static_cast<int>(*kind) : 0;
 }
 
 }  // namespace
@@ -138,20 +132,16 @@ std::vector<Mark> Marks::List(const MarkFilter& filter) {
     }
     const auto offset = static_cast<std::size_t>(std::max(filter.offset, 0));
     const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
-    const Span all{std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds, filter.end_s};
-    const std::string order = filter.newest_first ? "start_s desc, id desc" : "start_s, id";
-    const std::string condition =
-        " and start_s >= :from and start_s < :until and end_s > :begin and :kind in (0, kind) order by " + order +
-        " limit :limit";
     std::vector<Mark> marks;
     connection_.Read([&](soci::session& sql) {
-        for (const Span starts : NearestFirst(connection_, all, filter.newest_first)) {
-            if (marks.size() < offset + limit) {
-                ForEachCamera<Mark>(
-                    connection_, sql, filter.camera_ids, condition, order,
-                    [&marks](const Mark& mark) { marks.push_back(mark); }, starts.from_s, starts.until_s,
-                    filter.begin_s, NumberOf(filter.kind), static_cast<std::int64_t>(offset + limit));
+        for (const StartSpan starts : NearestFirst(connection_, StartsOf(filter), filter.newest_first)) {
+            if (marks.size() >= offset + limit) {
+                break;
             }
+            ForEachCamera<Mark>(
+                connection_, sql, filter.camera_ids, starts, filter.newest_first,
+                static_cast<std::int64_t>(offset + limit), [&marks](const Mark& mark) { marks.push_back(mark); },
+                " and end_s > :reached and :kind in (0, kind)", filter.begin_s, NumberOf(filter.kind));
         }
     });
     const auto key = [](const Mark& mark) { return std::pair(mark.start_s, mark.id); };
@@ -162,24 +152,7 @@ std::vector<Mark> Marks::List(const MarkFilter& filter) {
 }
 
 std::optional<Mark> Marks::Next(const Step& step, std::optional<MarkKind> kind) {
-    const std::string order = OrderText(step);
-    const std::string condition =
-        BehindText(step) + " and state = 1 and demo = 0 and :kind in (0, kind) order by " + order + " limit 1";
-    std::optional<Mark> next;
-    const auto take = [&](const Mark& mark) {
-        if (!next || step.IsNearer(mark, *next)) {
-            next = mark;
-        }
-    };
-    connection_.Read([&](soci::session& sql) {
-        for (const Span starts : NearestFirst(connection_, SpanOf(step), step.backwards)) {
-            if (!next) {
-                ForEachCamera<Mark>(connection_, sql, step.camera_ids, condition, order, take, starts.from_s,
-                                    starts.until_s, step.start_s, step.id, NumberOf(kind));
-            }
-        }
-    });
-    return next;
+    return NextRow<Mark>(connection_, step, " and state = 1 and demo = 0 and :kind in (0, kind)", NumberOf(kind));
 }
 
 std::vector<Mark> Marks::ReportedAfter(int id, int limit) {

@@ -6,15 +6,22 @@
 
 namespace lookhaven::store {
 
-// What there is becomes one partition, "…_earlier", up to the next month: it is neither copied nor is its index made
-// anew, but for that of the key, which takes a second for a million rows. What is dated later goes to "…_other", the
-// default partition, which has what no other takes. An empty table becomes none.
+// What there is becomes one partition, "…_earlier", up to the next month; what is dated later goes to the default one,
+// "…_default", which has what no other takes. An empty table becomes no partition. Nothing else is copied: each index is
+// declared again as it was, since PostgreSQL attaches an equal one of the old table instead of building it; they are
+// renamed to free their names. Only the primary key's is built.
 //
-// The key of a partitioned table holds what divides it, so ids alone are no key any more: that they are unique is for
-// the counter that they come from to see to. Nothing can refer to them, so a trigger removes a kept event's note.
+// The key of a partitioned table must hold the column that it is partitioned by, so PostgreSQL does not see to it any
+// more that an id is given once: the counter does, and Events::Begin. Nothing can refer to an event by its id, so a trigger
+// removes the note of a kept one.
+//
+// event_cameras   the pairs of camera and mount that have events, so that no search looks for them in each month. Adding
+//                 an event locks its pair's row in share mode, forgetting a pair locks it exclusively: so none goes
+//                 while an event is being added. The triggers do not run for what is moved between partitions.
+// event_months    the next id when a month was first seen: a hint where to look for one
 inline constexpr const char* kMonthPartitionsOnPostgresql[] = {
     "create table event_months (start_s bigint not null primary key, first_id integer not null)",
-    ("create table event_places (camera_id integer not null, mount_id integer not null,"
+    ("create table event_cameras (camera_id integer not null, mount_id integer not null,"
      " primary key (mount_id, camera_id))"),
     "alter table kept_events drop constraint kept_events_event_id_fkey",
     R"(do $do$
@@ -33,7 +40,7 @@ begin
         end loop;
         execute format('create table %I (like %I including defaults) partition by range (start_s)', divided,
                        divided || '_earlier');
-        execute format('create table %I partition of %I default', divided || '_other', divided);
+        execute format('create table %I partition of %I default', divided || '_default', divided);
         execute format('select exists (select from %I)', divided || '_earlier') into has_rows;
         if has_rows then
             execute format('insert into %I select * from %I where start_s >= $1', divided, divided || '_earlier')
@@ -67,33 +74,41 @@ end $do$)",
     "create index marks_pending on marks (end_s) where state = 0",
     "create index marks_pending_by_reporter on marks (reporter_id, reported_s) where state = 0 and reporter_id <> 0",
     "create index marks_demo on marks (id) where demo = 1",
-    "insert into event_places (camera_id, mount_id) select distinct camera_id, mount_id from events",
-    R"(create function event_added() returns trigger language plpgsql as $added$
+    "insert into event_cameras (camera_id, mount_id) select distinct camera_id, mount_id from events",
+    R"(create function event_added() returns trigger language plpgsql set search_path from current as $added$
+declare
+    pair record;
 begin
-    perform 1 from event_places where camera_id = new.camera_id and mount_id = new.mount_id for key share;
-    if not found then
-        insert into event_places (camera_id, mount_id) values (new.camera_id, new.mount_id) on conflict do nothing;
-    end if;
+    for pair in select distinct camera_id, mount_id from added order by mount_id, camera_id loop
+        loop
+            perform 1 from event_cameras where camera_id = pair.camera_id and mount_id = pair.mount_id for key share;
+            exit when found;
+            insert into event_cameras (camera_id, mount_id) values (pair.camera_id, pair.mount_id)
+                on conflict do nothing;
+            exit when found;
+        end loop;
+    end loop;
     return null;
 end $added$)",
-    "create trigger event_added after insert on events for each row execute function event_added()",
-    R"(create function forget_event_place(camera integer, mount integer) returns void language plpgsql as $forget$
+    ("create trigger event_added after insert on events referencing new table as added"
+     " for each statement execute function event_added()"),
+    R"(create function forget_event_camera(camera integer, mount integer) returns void language plpgsql
+    set search_path from current as $forget$
 begin
-    perform 1 from event_places where camera_id = camera and mount_id = mount for update;
-    delete from event_places where camera_id = camera and mount_id = mount
+    perform 1 from event_cameras where camera_id = camera and mount_id = mount for update;
+    delete from event_cameras where camera_id = camera and mount_id = mount
         and not exists (select from events where camera_id = camera and mount_id = mount);
 end $forget$)",
-    R"(create function event_removed() returns trigger language plpgsql as $removed$
+    R"(create function event_removed() returns trigger language plpgsql set search_path from current as $removed$
 begin
-    if old.archived = 1 then
-        delete from kept_events where event_id = old.id;
-    end if;
-    if not exists (select from events where camera_id = old.camera_id and mount_id = old.mount_id) then
-        perform forget_event_place(old.camera_id, old.mount_id);
-    end if;
+    delete from kept_events where event_id in (select id from removed where archived = 1);
+    perform forget_event_camera(camera_id, mount_id)
+        from (select distinct camera_id, mount_id from removed order by mount_id, camera_id) as pair
+        where not exists (select from events where camera_id = pair.camera_id and mount_id = pair.mount_id);
     return null;
 end $removed$)",
-    "create trigger event_removed after delete on events for each row execute function event_removed()",
+    ("create trigger event_removed after delete on events referencing old table as removed"
+     " for each statement execute function event_removed()"),
 };
 
 }  // namespace lookhaven::store

@@ -18,8 +18,8 @@ struct Migration {
     // What follows on one engine alone: nothing in it holds a record that is nowhere else.
     std::span<const char* const> on_sqlite = {};
     std::span<const char* const> on_postgresql = {};
-    // It only adds tables, or columns with a default, or changes indexes or partitions: programs that do not know it go on
-    // using the store.
+    // It adds tables, or columns with a default, or changes indexes, keys or partitions in a way that programs which do
+    // not know it need not know: they go on using the store.
     bool is_addition = false;
 };
 

@@ -75,7 +75,7 @@ int ReadVersionOfIdle(Connection& connection) {
         return ReadVersionOfReady(connection);
     }
     const char* query = "select version from schema_version where current_setting('transaction_read_only') = 'off'";
-    return connection.Read([&](soci::session& sql) { return std::stoi(AskWithin(kAnswerLimit, sql, query).value()); });
+    return connection.Read([&](soci::session& sql) { return std::stoi(AskWithin(sql, query, kAnswerLimit).value()); });
 }
 
 void CheckVersion(Connection& connection, int version) {

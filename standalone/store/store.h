@@ -94,8 +94,7 @@ class Store {
     static int SchemaVersion();
 
     // Whether Open would take the store still. False also where it cannot be read, where its server does not answer
-    // within two seconds, the time in which a new connection is made or refused, and where that server lets nothing be
-    // written: another one of its address may.
+    // within two seconds, and where that server is read-only: an address may name several.
     bool IsUpToDate();
 
     Store(Store&&) noexcept;

@@ -221,6 +221,7 @@ TEST_F(Admission, AConnectionThatWasOpenedAheadAndIsLostCostsNoRequest) {
     store::Users(records).Add("admin", "right password", store::Privilege::kOwner);
     base::WriteFileAtomically(host_.Home().Home() / "store", url);
     const std::string session = host_.LogIn().secret;
+    ASSERT_TRUE(host::Eventually(std::chrono::seconds(20), [&] { return host_.SpareProcesses().size() == 4; }));
     const auto spares = host_.SpareProcesses();
     std::ranges::for_each(spares, [](pid_t spare) { ::kill(spare, SIGKILL); });
     const std::string others = " from pg_stat_activity where datname = current_database() and pid <> pg_backend_pid()";

@@ -250,15 +250,17 @@ TEST_P(StoreTest, ALostServerIsToldFromAFailingStore) {
     }
     EXPECT_NO_THROW(store_.connection().Read([](soci::session& sql) { sql << "select 1"; }));
     if (GetParam() == Engine::kPostgresql) {
-        const int server = store_.connection().FetchOne<int>("select pg_backend_pid()").value();
+        Store other = Store::Open(url_);
+        const int server = other.connection().FetchOne<int>("select pg_backend_pid()").value();
         ::kill(server, SIGSTOP);
-        EXPECT_FALSE(store_.IsUpToDate()) << "it does not wait for a server that hangs";
+        EXPECT_FALSE(other.IsUpToDate()) << "it does not wait for a server that hangs";
         ::kill(server, SIGCONT);
         for (const bool can_write : {false, true}) {
             store_.connection().Read([&](soci::session& sql) {
                 sql << std::string("set default_transaction_read_only = ") + (can_write ? "off" : "on");
             });
-            EXPECT_EQ(store_.IsUpToDate(), can_write) << "it was demoted";
+            EXPECT_EQ(store_.IsUpToDate(), can_write);
+            EXPECT_EQ(store_.IsUpToDate(), can_write) << "it can be asked again";
         }
         const auto end = [](soci::session& sql) { sql << "select pg_terminate_backend(pg_backend_pid())"; };
         EXPECT_THROW(store_.connection().Read(end), StoreUnavailable);

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Has PostgreSQL's partitions of events and marks made and dropped, each hour. Does nothing for SQLite.
+// Maintains PostgreSQL's monthly partitions (store/month_partitions.h) every hour. Every host does; they take turns.
+// Nothing to do for SQLite.
 #pragma once
 
 #include <atomic>
@@ -12,13 +13,12 @@
 
 namespace lookhaven::recorder {
 
-class PartitionUpkeep {
+class PartitionMaintenance {
   public:
     // Begins at once, in a thread of its own. Throws std::system_error when no thread can be started.
-    explicit PartitionUpkeep(const std::string& store_url);
+    explicit PartitionMaintenance(const std::string& store_url);
 
-    // Call it each second; does not wait. What fails is tried again after ten minutes: who waits for a table that
-    // somebody else has locked holds up all who come after.
+    // Call it every second: does what is due; does not wait. After a failure again in ten minutes.
     void Ask();
 
     // As in StoreThread.
