@@ -103,7 +103,8 @@ class LH_PLATFORM_API RequestContext {
     SendQueue* Queue() const { return queue_; }
     void SetQueue(SendQueue* queue) { queue_ = queue; }
 
-    // The record store, opened by the first call, or checked by it where OpenRecordsAhead has opened it. Throws store::StoreError.
+    // The record store, opened by the first call, or checked by it where OpenRecordsAhead has opened it. Throws
+    // store::StoreError.
     store::Store& Records();
     // What this request has read; empty after CloseRecords and for another caller.
     RecordCache& Cache() { return cache_; }

@@ -72,8 +72,8 @@ bool IsEmpty(soci::session& sql, const std::string& table) {
     return !FetchOne<int>(sql, "select 1 from " + table + " limit 1");
 }
 
-// The table is locked first, in the order of readers: who waited for the default partition alone would look for rows that
-// were moved meanwhile by the list of partitions from before.
+// The table is locked first, in the order of readers: whoever waited for the default partition alone would then look
+// for rows that were moved in a list of partitions from before.
 void MakePartition(soci::session& sql, const std::string& table, year_month month) {
     const std::string rest = table + "_default";
     const std::string name = NameOf(table, month);

@@ -24,8 +24,8 @@ namespace lookhaven::store {
 // kMaxMovedRows there where it is. Drops partitions of past months that are empty. Nothing to do for SQLite.
 //
 // Any number of programs may call it at once: they take turns. It waits at most 1.5 s for a table's lock, since what
-// comes after it queues up behind; others then wait for the seconds in which rows are moved. Throws StoreError, also when
-// a lock is not to be had; partitions that were done before stay.
+// comes after it queues up behind; others then wait for the seconds in which rows are moved. Throws StoreError, also
+// when a lock is not to be had; partitions that were done before stay.
 void MaintainPartitions(Store& store);
 constexpr std::int64_t kMinEvents = 1'000;  // a few of a wrong clock, or of a month long ago, are not worth a partition
 constexpr std::int64_t kMaxMovedRows = 300'000;

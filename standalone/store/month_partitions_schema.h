@@ -6,18 +6,18 @@
 
 namespace lookhaven::store {
 
-// What there is becomes one partition, "…_earlier", up to the next month; what is dated later goes to the default one,
-// "…_default", which has what no other takes. An empty table becomes no partition. Nothing else is copied: each index is
-// declared again as it was, since PostgreSQL attaches an equal one of the old table instead of building it; they are
-// renamed to free their names. Only the primary key's is built.
+// What there is becomes one partition, "…_earlier", up to the next month; what is dated later goes to the default
+// one, "…_default", which has what no other takes. An empty table becomes no partition. Nothing else is copied: each
+// index is declared again as it was, since PostgreSQL attaches an equal one of the old table instead of building it;
+// they are renamed to free their names. Only the primary key's is built.
 //
 // The key of a partitioned table must hold the column that it is partitioned by, so PostgreSQL does not see to it any
-// more that an id is given once: the counter does, and Events::Begin. Nothing can refer to an event by its id, so a trigger
-// removes the note of a kept one.
+// more that an id is given once: the counter does, and Events::Begin. Nothing can refer to an event by its id, so a
+// trigger removes the note of a kept one.
 //
-// event_cameras   the pairs of camera and mount that have events, so that no search looks for them in each month. Adding
-//                 an event locks its pair's row in share mode, forgetting a pair locks it exclusively: so none goes
-//                 while an event is being added. The triggers do not run for what is moved between partitions.
+// event_cameras   the pairs of camera and mount that have events, so that no search looks for them in each month.
+//                 Adding an event locks its pair's row in share mode, forgetting a pair locks it exclusively: so none
+//                 goes while an event is being added. The triggers do not run for what moves between partitions.
 // event_months    the next id when a month was first seen: a hint where to look for one
 inline constexpr const char* kMonthPartitionsOnPostgresql[] = {
     "create table event_months (start_s bigint not null primary key, first_id integer not null)",

@@ -38,7 +38,8 @@ std::vector<StartSpan> NearestFirst(const Connection& connection, StartSpan all,
     return spans;
 }
 
-// The first id of a month is noted within an hour of its beginning, and recorders reserve ids ahead: hence the day more.
+// The first id of a month is noted within an hour of its beginning, and recorders reserve ids ahead: hence one day
+// more.
 StartSpan ProbableSpan(soci::session& sql, int id) {
     const auto [begin_s, end_s] =
         FetchOne<std::pair<std::int64_t, std::int64_t>>(

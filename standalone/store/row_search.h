@@ -2,9 +2,9 @@
 //
 // How events and marks are searched alike. For this folder's sources.
 //
-// Why so        PostgreSQL has a partition of either for each month, and a new connection, as a request's may be, has to
-//               read from the catalogue what each of those is that it is to look into. So a search reads the few in
-//               which its answer most likely lies first, and the others only where it has to.
+// Why so        PostgreSQL has a partition of either for each month, and a new connection has to read from the
+//               catalogue what each of those is that it looks into. So a search reads the few in which its answer
+//               most likely lies first, and the others only where it has to.
 #pragma once
 
 #include <cstdint>
@@ -64,9 +64,9 @@ std::string EachCameraText(const std::string& condition, const std::string& orde
 }
 
 // Calls visit(const Row&) for at most limit rows of each camera that start in the span and meet the condition
-// (" and …"), in the order of OrderOfStarts, camera by camera. Either engine looks each camera up by itself: that way it
-// uses the index (camera, start) for all of it, the order too, however many cameras are asked for. SQLite is asked once
-// a camera; PostgreSQL, to which a question is a round trip and a plan, once.
+// (" and …"), in the order of OrderOfStarts, camera by camera. Either engine looks each camera up by itself: that way
+// it uses the index (camera, start) for all of it, the order too, however many cameras are asked for. SQLite is asked
+// once a camera; PostgreSQL, to which a question is a round trip and a plan, once.
 template <typename Row, typename Visit, typename... Parameter>
 void ForEachCamera(Connection& connection, soci::session& sql, const std::set<int>& camera_ids, StartSpan starts,
                    bool newest_first, std::int64_t limit, const Visit& visit, const std::string& condition,
