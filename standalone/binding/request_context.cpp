@@ -5,7 +5,6 @@
 #include <stdexcept>
 #include <string>
 #include <string_view>
-#include <utility>
 
 #include <malloc.h>
 #include <sys/stat.h>
@@ -74,10 +73,12 @@ const base::Installation& RequestContext::Installation() const {
 }
 
 store::Store& RequestContext::Records() {
-    if (const auto ahead = std::exchange(opened_ahead_, std::nullopt)) {
-        if (*ahead != IdentityOf(Installation().StoreUrl()) || !records_->IsUpToDate()) {
+    if (opened_ahead_) {
+        const bool is_same = opened_ahead_ == IdentityOf(Installation().StoreUrl());
+        if (!is_same || !records_->IsUpToDate()) {
             records_.reset();
         }
+        opened_ahead_.reset();
     }
     if (records_ == nullptr) {
         records_ = std::make_unique<store::Store>(store::Store::Open(Installation().StoreUrl()));

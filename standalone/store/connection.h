@@ -73,8 +73,9 @@ class Connection {
         });
     }
 
-    // Calls ask(session), to which the store stays as it is at one moment while others go on changing it. Not inside
-    // another, nor inside Write.
+    // Calls ask(session), to which the store stays as it is at one moment while others go on changing it, but for
+    // partitions: name no span of starts, which may lie in one that was made since. Not inside another, nor inside
+    // Write.
     template <typename Ask>
     auto ReadAtOneMoment(Ask&& ask) {
         return Read([&](soci::session& sql) {

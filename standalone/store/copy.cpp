@@ -5,6 +5,7 @@
 #include <array>
 #include <cstddef>
 #include <deque>
+#include <map>
 #include <optional>
 #include <set>
 #include <string>
@@ -223,16 +224,19 @@ std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions, Co
     return source.connection().ReadAtOneMoment([&](soci::session& from) {
         RequireKnown(from);
         LiftTimeLimit(source.connection(), from);
+        const std::map<std::int64_t, std::int64_t> events_by_day =
+            target.IsSqlite() ? std::map<std::int64_t, std::int64_t>() : EventsByDay(from, "events");
         return target.connection().Write([&](soci::session& to) {
             LiftTimeLimit(target.connection(), to);
+            LockSchema(target.connection(), to);
             RequireUnused(target);
-            for (auto table = tables.rbegin(); table != tables.rend(); ++table) {
-                Execute(to, "delete from " + *table);
-            }
             if (!target.connection().IsSqlite()) {
                 // Else all would go to the default partition, and be moved out of that later.
-                MakePartitionsFor(to, EventsByDay(from, "events"));
+                MakePartitionsFor(to, events_by_day);
                 Execute(to, "delete from event_months");
+            }
+            for (auto table = tables.rbegin(); table != tables.rend(); ++table) {
+                Execute(to, "delete from " + *table);
             }
             std::int64_t rows = 0;
             for (const std::string& table : tables) {

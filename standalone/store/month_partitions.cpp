@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <array>
 #include <chrono>
+#include <exception>
 #include <functional>
 #include <limits>
 #include <string>
@@ -20,7 +21,12 @@ namespace {
 using std::chrono::months;
 using std::chrono::year_month;
 
-constexpr std::array<const char*, 2> kPartitionedTables = {"events", "marks"};
+// Making the index of words takes most of the time of moving marks.
+struct PartitionedTable {
+    const char* name;
+    std::int64_t max_moved_rows;
+};
+constexpr std::array<PartitionedTable, 2> kPartitionedTables = {{{"events", 200'000}, {"marks", 30'000}}};
 constexpr std::int64_t kDayS = 86'400;
 
 // Of [begin_s, end_s).
@@ -69,18 +75,20 @@ std::vector<Partition> PartitionsOf(soci::session& sql, const std::string& table
 }
 
 bool IsEmpty(soci::session& sql, const std::string& table) {
-    return !FetchOne<int>(sql, "select 1 from " + table + " limit 1");
+    // In the order of an index: the beginning of the table may have been emptied.
+    return !Exists(sql, "select id from " + table + " order by id desc limit 1");
 }
 
 // The table is locked first, in the order of readers: whoever waited for the default partition alone would then look
 // for rows that were moved in a list of partitions from before.
-void MakePartition(soci::session& sql, const std::string& table, year_month month) {
+void MakePartition(soci::session& sql, const PartitionedTable& partitioned, year_month month) {
+    const std::string table = partitioned.name;
     const std::string rest = table + "_default";
     const std::string name = NameOf(table, month);
     const std::string begin = std::to_string(StartOf(month));
     const std::string end = std::to_string(StartOf(month + months(1)));
     const std::string rows = " from " + rest + " where start_s >= " + begin + " and start_s < " + end;
-    if (Exists(sql, "select 1" + rows + " offset :most limit 1", kMaxMovedRows)) {
+    if (Exists(sql, "select 1" + rows + " offset :most limit 1", partitioned.max_moved_rows)) {
         return;
     }
     sql << "lock table only " + table;
@@ -91,15 +99,13 @@ void MakePartition(soci::session& sql, const std::string& table, year_month mont
     sql << "alter table " + table + " attach partition " + name + " for values from (" + begin + ") to (" + end + ")";
 }
 
-void MakePartitions(soci::session& sql, year_month month) {
-    for (const char* table : kPartitionedTables) {
-        const std::int64_t start_s = StartOf(month);
-        const std::vector<Partition> partitions = PartitionsOf(sql, table);
-        if (std::ranges::none_of(partitions, [start_s](const Partition& partition) {
-                return partition.begin_s <= start_s && start_s < partition.end_s;
-            })) {
-            MakePartition(sql, table, month);
-        }
+void MakePartitionIfNone(soci::session& sql, const PartitionedTable& table, year_month month) {
+    const std::int64_t start_s = StartOf(month);
+    const std::vector<Partition> partitions = PartitionsOf(sql, table.name);
+    if (std::ranges::none_of(partitions, [start_s](const Partition& partition) {
+            return partition.begin_s <= start_s && start_s < partition.end_s;
+        })) {
+        MakePartition(sql, table, month);
     }
 }
 
@@ -142,7 +148,9 @@ std::map<std::int64_t, std::int64_t> EventsByDay(soci::session& sql, const char*
 
 void MakePartitionsFor(soci::session& sql, const std::map<std::int64_t, std::int64_t>& events_by_day) {
     for (const year_month month : MonthsOf(sql, events_by_day)) {
-        MakePartitions(sql, month);
+        for (const PartitionedTable& table : kPartitionedTables) {
+            MakePartitionIfNone(sql, table, month);
+        }
     }
 }
 
@@ -155,8 +163,24 @@ void MaintainPartitions(Store& store) {
         return connection.Write([&](soci::session& sql) {
             LockSchema(connection, sql);  // nobody waits behind whoever waits for this lock
             sql << "set local lock_timeout = '1500ms'";
+            sql << "set local statement_timeout = '60s'";  // a slow disk would fail again each time
             return work(sql);
         });
+    };
+    std::exception_ptr failure;
+    const auto attempt = [&](auto&& work) {
+        try {
+            change(work);
+        } catch (const StoreUnavailable&) {
+            throw;
+        } catch (const StoreError&) {
+            failure = std::current_exception();
+        }
+    };
+    const auto make = [&](year_month month) {
+        for (const PartitionedTable& table : kPartitionedTables) {
+            attempt([&](soci::session& sql) { MakePartitionIfNone(sql, table, month); });
+        }
     };
     const year_month now = change([](soci::session& sql) {
         const year_month month = ThisMonth(sql);
@@ -167,22 +191,20 @@ void MaintainPartitions(Store& store) {
                 StartOf(month));
         return month;
     });
-    for (const year_month month : {now, now + months(1)}) {
-        change([month](soci::session& sql) { MakePartitions(sql, month); });
-    }
+    make(now);
+    make(now + months(1));
     // Two transactions that each removed an event while the other's was still visible have both left its pair.
-    change([](soci::session& sql) {
+    attempt([](soci::session& sql) {
         Execute(sql, "select forget_event_camera(camera_id, mount_id) from event_cameras as pair where not exists"
                      " (select from events where camera_id = pair.camera_id and mount_id = pair.mount_id)");
     });
-    for (const char* table : kPartitionedTables) {
-        change([&](soci::session& sql) { DropEmpty(sql, table, StartOf(now)); });
+    for (const PartitionedTable& table : kPartitionedTables) {
+        attempt([&](soci::session& sql) { DropEmpty(sql, table.name, StartOf(now)); });
     }
-    // Last, since what is odd about a month long ago must not keep the others from being made.
-    const std::vector<year_month> past =
-        connection.Read([](soci::session& sql) { return MonthsOf(sql, EventsByDay(sql, "events_default")); });
-    for (const year_month month : past) {
-        change([month](soci::session& sql) { MakePartitions(sql, month); });
+    std::ranges::for_each(
+        connection.Read([](soci::session& sql) { return MonthsOf(sql, EventsByDay(sql, "events_default")); }), make);
+    if (failure) {
+        std::rethrow_exception(failure);
     }
 }
 

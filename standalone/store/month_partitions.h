@@ -20,21 +20,21 @@ class session;
 namespace lookhaven::store {
 
 // Makes the partitions of this month and the next by the server's clock, and those of earlier months that have from
-// kMinEvents events on in the default partition; what that has of a month is moved. Leaves a month that has more than
-// kMaxMovedRows there where it is. Drops partitions of past months that are empty. Nothing to do for SQLite.
+// kMinEvents events on in the default partition; what that has of a month is moved. Leaves a month that has so many rows
+// there that moving them would hold up others for long. Drops partitions of past months that are empty. Nothing to do for
+// SQLite.
 //
 // Any number of programs may call it at once: they take turns. It waits at most 1.5 s for a table's lock, since what
-// comes after it queues up behind; others then wait for the seconds in which rows are moved. Throws StoreError, also
-// when a lock is not to be had; partitions that were done before stay.
+// comes after it queues up behind; others then wait for the one or two seconds in which rows are moved. Throws
+// StoreError, also when a lock is not to be had, after it has done what it can of the rest.
 void MaintainPartitions(Store& store);
 constexpr std::int64_t kMinEvents = 1'000;  // a few of a wrong clock, or of a month long ago, are not worth a partition
-constexpr std::int64_t kMaxMovedRows = 300'000;
 
 // How many events start on each day, by its number since 1970-01-01.
 std::map<std::int64_t, std::int64_t> EventsByDay(soci::session& sql, const char* table);
 
 // For a store of PostgreSQL that is about to be filled with those: the partitions of months that have from kMinEvents
-// on, but of none after the next month. Inside Write only.
+// on, but of none after the next month. Inside Write, after LockSchema, only.
 void MakePartitionsFor(soci::session& sql, const std::map<std::int64_t, std::int64_t>& events_by_day);
 
 }  // namespace lookhaven::store

@@ -153,6 +153,22 @@ TEST_P(MonthPartitionsTest, AreMadeForWhatIsRecordedAndDroppedOnceTheyAreEmpty) 
                                 " marks_" + next + " marks_default");
 }
 
+TEST_P(MonthPartitionsTest, AMonthWithTooMuchToMoveOrAFaultKeepsNoOtherFromBeingMade) {
+    Store::Migrate(url_);
+    Store store = Store::Open(url_);
+    for (const std::int64_t start_s : {kOld, kOld + 40 * 86'400, kOld + 70 * 86'400}) {
+        Events(store).AddAll(std::vector(kMinEvents, EventAt(start_s)));
+    }
+    Force("insert into marks select n, 1, 5, 0, " + std::to_string(kOld) +
+          ", 0, '', 2, 0, '', 0 from generate_series(1, 30001) as n");
+    Force("create table events_2020_03 (id integer)");
+    EXPECT_THROW(MaintainPartitions(store), StoreError);
+    EXPECT_EQ(PartitionOf("events", 1), "events_2020_01");
+    EXPECT_EQ(PartitionOf("marks", 1), "marks_default");
+    EXPECT_EQ(PartitionOf("events", kMinEvents + 1), "events_2020_02");
+    EXPECT_EQ(PartitionOf("events", 2 * kMinEvents + 1), "events_default");
+}
+
 TEST_P(MonthPartitionsTest, ManyEventsOfACameraAreRemovedAtOnce) {
     Store::Migrate(url_);
     Store store = Store::Open(url_);
