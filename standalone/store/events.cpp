@@ -5,6 +5,8 @@
 
 #include <algorithm>
 #include <limits>
+#include <string>
+#include <vector>
 
 #include "standalone/store/connection.h"
 #include "standalone/store/event_row.h"
@@ -70,6 +72,50 @@ int Move(Connection& connection, std::span<const int> ids, const std::string& fr
         const std::string not_moved = " where id = :id and id in (select id from " + from + ")";
         return copied - ForEachId(sql, ids, "delete from " + to + not_moved);
     });
+}
+
+int GrowEach(soci::session& sql, std::span<const Event> events) {
+    Event row;
+    std::int64_t first_start_s = 0;
+    soci::statement update =
+        Prepare(sql, kRepeatedly,
+                "update events set end_s = :end, frame_count = :frames, size_bytes = :size, recording = 1"
+                " where id = :id and start_s between :first and :last",
+                row.end_s, row.frame_count, row.size_bytes, row.id, first_start_s, row.end_s);
+    int changed = 0;
+    for (const Event& event : events) {
+        row = event;
+        first_start_s = row.end_s - base::kMaxRecordingSeconds;
+        changed += Run(update);
+    }
+    return changed;
+}
+
+// For PostgreSQL, which would make a plan for each row: in which partitions it may be.
+int GrowAtOnce(soci::session& sql, std::span<const Event> events) {
+    if (events.empty()) {
+        return 0;
+    }
+    std::vector<int> ids;
+    std::vector<std::int64_t> ends_s;
+    std::vector<int> frame_counts;
+    std::vector<std::int64_t> sizes_bytes;
+    for (const Event& event : events) {
+        ids.push_back(event.id);
+        ends_s.push_back(event.end_s);
+        frame_counts.push_back(event.frame_count);
+        sizes_bytes.push_back(event.size_bytes);
+    }
+    const auto [first_s, last_s] = std::ranges::minmax(ends_s);
+    const std::int64_t first_start_s = first_s - base::kMaxRecordingSeconds;
+    return Execute(sql,
+                   "update events set end_s = grown.end_s, frame_count = grown.frame_count,"
+                   " size_bytes = grown.size_bytes, recording = 1 from unnest(cast(:ids as integer[]),"
+                   " cast(:ends as bigint[]), cast(:frames as integer[]), cast(:sizes as bigint[]))"
+                   " as grown (id, end_s, frame_count, size_bytes) where events.id = grown.id"
+                   " and start_s between grown.end_s - :longest and grown.end_s and start_s between :first and :last",
+                   ArrayText(ids), ArrayText(ends_s), ArrayText(frame_counts), ArrayText(sizes_bytes),
+                   base::kMaxRecordingSeconds, first_start_s, last_s);
 }
 
 }  // namespace
@@ -140,22 +186,7 @@ bool Events::Finish(int id, std::int64_t end_s, int frame_count, std::int64_t si
 
 int Events::Grow(std::span<const Event> events) {
     return connection_.Write(
-        [&](soci::session& sql) {
-            Event row;
-            std::int64_t first_start_s = 0;
-            soci::statement update =
-                Prepare(sql, kRepeatedly,
-                        "update events set end_s = :end, frame_count = :frames, size_bytes = :size, recording = 1"
-                        " where id = :id and start_s between :first and :last",
-                        row.end_s, row.frame_count, row.size_bytes, row.id, first_start_s, row.end_s);
-            int changed = 0;
-            for (const Event& event : events) {
-                row = event;
-                first_start_s = row.end_s - base::kMaxRecordingSeconds;
-                changed += Run(update);
-            }
-            return changed;
-        },
+        [&](soci::session& sql) { return connection_.IsSqlite() ? GrowEach(sql, events) : GrowAtOnce(sql, events); },
         Durability::kLazy);
 }
 

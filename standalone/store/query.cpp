@@ -20,14 +20,6 @@ int Run(soci::statement& statement) {
     return static_cast<int>(statement.get_affected_rows());
 }
 
-std::string ArrayText(const std::set<int>& numbers) {
-    std::string text = "{";
-    for (const int number : numbers) {
-        text += (text.size() > 1 ? "," : "") + std::to_string(number);
-    }
-    return text + "}";
-}
-
 std::string InsertText(const std::string& table, const std::string& columns) {
     return "insert into " + table + " (" + columns + ") values (" + Placeholders(columns) + ")";
 }

@@ -10,7 +10,6 @@
 #pragma once
 
 #include <optional>
-#include <set>
 #include <string>
 #include <tuple>
 #include <type_traits>
@@ -148,7 +147,13 @@ bool Exists(soci::session& sql, const std::string& text, const Parameter&... par
 }
 
 // An array in PostgreSQL's text form.
-std::string ArrayText(const std::set<int>& numbers);
+std::string ArrayText(const auto& numbers) {
+    std::string text = "{";
+    for (const auto number : numbers) {
+        text += (text.size() > 1 ? "," : "") + std::to_string(number);
+    }
+    return text + "}";
+}
 
 // "insert into <table> (a, b) values (:a, :b)" and "update <table> set b = :b where a = :a".
 std::string InsertText(const std::string& table, const std::string& columns);
