@@ -20,9 +20,9 @@ class session;
 namespace lookhaven::store {
 
 // Makes the partitions of this month and the next by the server's clock, and those of earlier months that have from
-// kMinEvents events on in the default partition; what that has of a month is moved. Leaves a month that has so many rows
-// there that moving them would hold up others for long. Drops partitions of past months that are empty. Nothing to do for
-// SQLite.
+// kMinEvents events on in the default partition; what that has of a month is moved. Leaves a month that has so many
+// rows there that moving them would hold up others for long. Drops partitions of past months that are empty. Nothing to
+// do for SQLite.
 //
 // Any number of programs may call it at once: they take turns. It waits at most 1.5 s for a table's lock, since what
 // comes after it queues up behind; others then wait for the one or two seconds in which rows are moved. Throws
