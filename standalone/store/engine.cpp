@@ -37,9 +37,8 @@ void WarmUpSqlite() {
     throw StoreError(std::string("cannot load the client of PostgreSQL: ") + ::dlerror());
 }
 
-// A function of SOCI's part for PostgreSQL, or of libpq, with which that is linked. Throws StoreError.
-template <typename Function>
-Function* FindFunction(const char* name) {
+// SOCI's part for PostgreSQL, for the rest of the process's life. Throws StoreError.
+void* Library() {
     static void* const library = [] {
         const std::string file = "libsoci_postgresql.so." + std::to_string(SOCI_VERSION / 100'000) + '.' +
                                  std::to_string(SOCI_VERSION / 100 % 1'000);
@@ -49,7 +48,13 @@ Function* FindFunction(const char* name) {
         }
         return opened;
     }();
-    void* found = ::dlsym(library, name);
+    return library;
+}
+
+// A function of that library, or of libpq, with which it is linked. Throws StoreError.
+template <typename Function>
+Function* FindFunction(const char* name) {
+    void* found = ::dlsym(Library(), name);
     if (found == nullptr) {
         ThrowNoClient();
     }
