@@ -130,7 +130,8 @@ std::vector<Mark> FindMarksByWords(Connection& connection, const MarkFilter& fil
             std::ranges::move(OnPostgresql(sql, filter, starts, wanted - std::ssize(found), 0),
                               std::back_inserter(found));
         }
-        found.erase(found.begin(), found.begin() + std::min<std::ptrdiff_t>(offset, std::ssize(found)));
+        found.erase(found.begin(),
+                    found.begin() + static_cast<std::ptrdiff_t>(std::min<std::int64_t>(offset, std::ssize(found))));
         return found;
     });
 }
