@@ -89,8 +89,9 @@ class LH_PLATFORM_API RequestContext {
     RequestContext& operator=(const RequestContext&) = delete;
 
     // In a process that waits for its request: opens the store, and reads it once as requests do, so that their first
-    // read is fast. Records opens it anew when it is out of date by then: the installation has another store, or the
-    // store another schema, or the connection to its server is lost. Throws store::StoreError.
+    // read is fast. Records opens it anew when it is out of date by then: the installation has another store, the store
+    // another schema, or its server is lost, takes no changes or does not answer within two seconds. Throws
+    // store::StoreError.
     void OpenRecordsAhead(const base::Installation& installation);
 
     // Borrows output for the rest of the process's life, null where nothing is sent.
@@ -168,7 +169,7 @@ class LH_PLATFORM_API RequestContext {
     SendQueue* queue_ = nullptr;
     RequestEvents events_;
     std::unique_ptr<store::Store> records_;
-    std::optional<StoreIdentity> opened_ahead_;  // what records_ is, until it is known to be up to date
+    std::optional<StoreIdentity> opened_ahead_;  // the store of records_, until that is known to be up to date
     RecordCache cache_;
     unsigned int caller_ = 0;
     std::string session_;

@@ -17,11 +17,11 @@ constexpr std::int64_t kRetryUs = 10 * kMinuteUs;
 PartitionMaintenance::PartitionMaintenance(const std::string& store_url)
     : next_us_(base::MonotonicMicros() + kRetryUs) {
     if (!store_url.starts_with("sqlite:")) {
-        thread_.emplace(store_url, "maintain the store's partitions",
-                        [this](store::Store& store, const std::stop_token&) {
-                            store::MaintainPartitions(store);
-                            next_us_ = base::MonotonicMicros() + kIntervalUs;
-                        });
+        const auto work = [this](store::Store& store, const std::stop_token& stop) {
+            store::MaintainPartitions(store, stop);
+            next_us_ = base::MonotonicMicros() + kIntervalUs;
+        };
+        thread_.emplace(store_url, "maintain the store's partitions", work, StoreThread::Idle::kCloses);
     }
 }
 

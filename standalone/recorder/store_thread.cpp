@@ -9,10 +9,11 @@
 
 namespace lookhaven::recorder {
 
-StoreThread::StoreThread(std::string store_url, std::string purpose, Work work)
+StoreThread::StoreThread(std::string store_url, std::string purpose, Work work, Idle idle)
     : store_url_(std::move(store_url)),
       purpose_(std::move(purpose)),
-      work_(std::move(work)) {
+      work_(std::move(work)),
+      idle_(idle) {
     const base::BlockedSignals blocked;
     thread_ = std::jthread([this](const std::stop_token& stop) { Run(stop); });
 }
@@ -39,6 +40,9 @@ void StoreThread::TryToWork(const std::stop_token& stop) noexcept {
             store_.emplace(store::Store::Open(store_url_));
         }
         work_(*store_, stop);
+        if (idle_ == Idle::kCloses) {
+            store_.reset();
+        }
         if (!std::exchange(reported_failure_, {}).empty()) {
             base::LogInfo("can " + purpose_ + " again");
         }

@@ -22,11 +22,14 @@ namespace lookhaven::recorder {
 class StoreThread {
   public:
     using Work = std::function<void(store::Store& store, const std::stop_token& stop)>;
+    // What becomes of the connection after the work. Work that is asked for rarely closes it: a server may end a
+    // connection that is idle for long.
+    enum class Idle { kStaysOpen, kCloses };
 
     // Starts the thread, which takes no signals and does the work once. When the work or the opening of the store
     // throws, "cannot <purpose>" is logged once for each reason, and the store is opened again the next time. Throws
     // std::system_error when no thread can be started.
-    StoreThread(std::string store_url, std::string purpose, Work work);
+    StoreThread(std::string store_url, std::string purpose, Work work, Idle idle = Idle::kStaysOpen);
 
     // Has the thread do the work soon; requests made before it starts count as one. Does not wait.
     void Ask();
@@ -43,6 +46,7 @@ class StoreThread {
     const std::string store_url_;
     const std::string purpose_;
     const Work work_;
+    const Idle idle_;
 
     // Only the thread uses these.
     std::optional<store::Store> store_;

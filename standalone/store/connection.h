@@ -73,9 +73,9 @@ class Connection {
         });
     }
 
-    // Calls ask(session), to which the store stays as it is at one moment while others go on changing it, but for
-    // partitions: name no span of starts, which may lie in one that was made since. Not inside another, nor inside
-    // Write.
+    // Calls ask(session), to which the store stays as it is at one moment while others go on changing it. On PostgreSQL
+    // put no condition on start_s: of rows that were moved to a new partition meanwhile, such a session sees those that
+    // are in the default partition, which the condition may leave out. Not inside another, nor inside Write.
     template <typename Ask>
     auto ReadAtOneMoment(Ask&& ask) {
         return Read([&](soci::session& sql) {

@@ -231,9 +231,9 @@ std::int64_t CopyRecords(Store& source, Store& target, CopySessions sessions, Co
             LockSchema(target.connection(), to);
             RequireUnused(target);
             if (!target.connection().IsSqlite()) {
-                // Else all would go to the default partition, and be moved out of that later.
+                // Otherwise all rows would go to the default partition and have to be moved later.
                 MakePartitionsFor(to, events_by_day);
-                Execute(to, "delete from event_months");
+                Execute(to, "delete from month_first_ids");  // they are not of the ids that are copied
             }
             for (auto table = tables.rbegin(); table != tables.rend(); ++table) {
                 Execute(to, "delete from " + *table);

@@ -16,14 +16,14 @@ namespace {
 
 constexpr int kRowsPerBatch = 10'000;
 
-// Nothing starts before it and still reaches the filter's span.
+// The starts to search: what starts earlier cannot reach into the filter's span.
 StartSpan StartsOf(const EventFilter& filter) {
     return {std::max(filter.begin_s, base::kMaxRecordingSeconds) - base::kMaxRecordingSeconds, filter.end_s};
 }
 
 // The filter's rows that start then, camera by camera.
 void Search(Connection& connection, soci::session& sql, const EventFilter& filter, StartSpan starts, std::int64_t limit,
-            const Events::Visitor& visit) {
+            const auto& visit) {
     const std::string condition = " and end_s > :reached and :mount in (0, mount_id) and :reason in (0, reason)"
                                   " and (:finished = 0 or recording = 0)" +
                                   // As the condition of an index: kept events are few.
@@ -47,25 +47,10 @@ std::optional<Event> Events::Find(int id) {
 }
 
 std::vector<Event> Events::List(const EventFilter& filter) {
-    const auto offset = static_cast<std::size_t>(std::max(filter.offset, 0));
-    const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
-    std::vector<Event> events;
-    connection_.Read([&](soci::session& sql) {
-        for (const StartSpan starts : NearestFirst(connection_, StartsOf(filter), filter.newest_first)) {
-            if (events.size() >= offset + limit) {
-                break;
-            }
-            Search(connection_, sql, filter, starts, static_cast<std::int64_t>(offset + limit),
-                   [&](const Event& event) { events.push_back(event); });
-        }
-    });
-    const auto key = [](const Event& event) { return std::pair(event.start_s, event.id); };
-    if (filter.camera_ids.size() > 1) {
-        filter.newest_first ? std::ranges::sort(events, std::greater{}, key) : std::ranges::sort(events, {}, key);
-    }
-    events.resize(std::min(events.size(), offset + limit));
-    events.erase(events.begin(), events.begin() + static_cast<std::ptrdiff_t>(std::min(events.size(), offset)));
-    return events;
+    return ListRows<Event>(connection_, filter, StartsOf(filter),
+                           [&](soci::session& sql, StartSpan starts, std::int64_t limit, const auto& visit) {
+                               Search(connection_, sql, filter, starts, limit, visit);
+                           });
 }
 
 void Events::Visit(const EventFilter& filter, const Visitor& visitor) {

@@ -48,11 +48,16 @@ Event WithOrder(Event event) {
     return event;
 }
 
-// Runs the statement for each id; returns the number of rows changed.
-int ForEachId(soci::session& sql, std::span<const int> ids, const std::string& text) {
+// Runs the text (without " where …") for the rows of those ids that meet the conditions (" and …", or ""); returns how
+// many. On PostgreSQL once, since a trigger runs for each statement.
+int ForIds(Connection& connection, soci::session& sql, std::span<const int> ids, const std::string& text,
+           const std::string& conditions = "") {
+    if (!connection.IsSqlite()) {
+        return Execute(sql, text + " where id = any (cast(:ids as integer[]))" + conditions, ArrayText(ids));
+    }
     int id = 0;
     int changed = 0;
-    soci::statement statement = Prepare(sql, kRepeatedly, text, id);
+    soci::statement statement = Prepare(sql, kRepeatedly, text + " where id = :id" + conditions, id);
     for (const int next : ids) {
         id = next;
         changed += Run(statement);
@@ -62,15 +67,15 @@ int ForEachId(soci::session& sql, std::span<const int> ids, const std::string& t
 
 // Returns how many were moved.
 int Move(Connection& connection, std::span<const int> ids, const std::string& from, const std::string& to,
-         const std::string& condition) {
+         const std::string& conditions) {
     const std::string columns = Mapping<Event>::kColumns;
-    const std::string which = " from " + from + " where id = :id" + condition;
     return connection.Write([&](soci::session& sql) {
-        const int copied = ForEachId(sql, ids, "insert into " + to + " (" + columns + ") select " + columns + which);
-        ForEachId(sql, ids, "delete" + which + " and id in (select id from " + to + ")");
-        // On PostgreSQL a row may have come to meet the condition, or no longer to meet it, between the two.
-        const std::string not_moved = " where id = :id and id in (select id from " + from + ")";
-        return copied - ForEachId(sql, ids, "delete from " + to + not_moved);
+        const int copied =
+            ForIds(connection, sql, ids, "insert into " + to + " (" + columns + ") select " + columns + " from " + from,
+                   conditions);
+        ForIds(connection, sql, ids, "delete from " + from, conditions + " and id in (select id from " + to + ")");
+        // On PostgreSQL a row may have come to meet the conditions, or no longer to meet them, between the two.
+        return copied - ForIds(connection, sql, ids, "delete from " + to, " and id in (select id from " + from + ")");
     });
 }
 
@@ -91,7 +96,7 @@ int GrowEach(soci::session& sql, std::span<const Event> events) {
     return changed;
 }
 
-// For PostgreSQL, which would make a plan for each row: in which partitions it may be.
+// For PostgreSQL, which would plan the statement of GrowEach anew for each row, to find the row's partitions.
 int GrowAtOnce(soci::session& sql, std::span<const Event> events) {
     if (events.empty()) {
         return 0;
@@ -106,8 +111,9 @@ int GrowAtOnce(soci::session& sql, std::span<const Event> events) {
         frame_counts.push_back(event.frame_count);
         sizes_bytes.push_back(event.size_bytes);
     }
-    const auto [first_s, last_s] = std::ranges::minmax(ends_s);
-    const std::int64_t first_start_s = first_s - base::kMaxRecordingSeconds;
+    // One range for all rows, by which the planner leaves out partitions.
+    const auto [first_end_s, last_end_s] = std::ranges::minmax(ends_s);
+    const std::int64_t first_start_s = first_end_s - base::kMaxRecordingSeconds;
     return Execute(sql,
                    "update events set end_s = grown.end_s, frame_count = grown.frame_count,"
                    " size_bytes = grown.size_bytes, recording = 1 from unnest(cast(:ids as integer[]),"
@@ -115,7 +121,7 @@ int GrowAtOnce(soci::session& sql, std::span<const Event> events) {
                    " as grown (id, end_s, frame_count, size_bytes) where events.id = grown.id"
                    " and start_s between grown.end_s - :longest and grown.end_s and start_s between :first and :last",
                    ArrayText(ids), ArrayText(ends_s), ArrayText(frame_counts), ArrayText(sizes_bytes),
-                   base::kMaxRecordingSeconds, first_start_s, last_s);
+                   base::kMaxRecordingSeconds, first_start_s, last_end_s);
 }
 
 }  // namespace
@@ -191,8 +197,7 @@ int Events::Grow(std::span<const Event> events) {
 }
 
 int Events::Remove(std::span<const int> ids) {
-    return connection_.Write(
-        [&](soci::session& sql) { return ForEachId(sql, ids, "delete from events where id = :id"); });
+    return connection_.Write([&](soci::session& sql) { return ForIds(connection_, sql, ids, "delete from events"); });
 }
 
 int Events::BeginDeletion(std::span<const int> ids) {
@@ -226,7 +231,7 @@ void Events::BeginDeletionOfCamera(int camera_id) {
 
 void Events::FinishDeletion(std::span<const int> ids) {
     connection_.Write(
-        [&](soci::session& sql) { ForEachId(sql, ids, "delete from events_pending_deletion where id = :id"); });
+        [&](soci::session& sql) { ForIds(connection_, sql, ids, "delete from events_pending_deletion"); });
 }
 
 void Events::SetMissingOrders(int mount_id) {

@@ -142,8 +142,8 @@ class Events {
     // event would end before it starts or become too long.
     bool Finish(int id, std::int64_t end_s, int frame_count, std::int64_t size_bytes);
     // What has grown, by id, with end_s, frame_count and size_bytes; in one transaction, since a host has one for each of
-    // its cameras each second. Returns how many it has changed: an unknown one is left out, and so is one that Finish
-    // would refuse; each event once. A power cut may lose a Grow that has returned, never a Finish.
+    // its cameras each second; no id may occur twice. Returns how many it has changed: an unknown one is left out, and
+    // so is one that Finish would refuse. A power cut may lose a Grow that has returned, never a Finish.
     int Grow(std::span<const Event> events);
 
     // In one transaction; returns the number of rows removed. For rows without a file.

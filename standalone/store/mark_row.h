@@ -35,7 +35,7 @@ inline int NumberOf(std::optional<MarkKind> kind) {
     return kind ? static_cast<int>(*kind) : 0;
 }
 
-// Nothing starts before it and still reaches the filter's span.
+// The starts to search: what starts earlier cannot reach into the filter's span.
 inline StartSpan StartsOf(const MarkFilter& filter) {
     return {std::max(filter.begin_s, kMaxFootageSeconds) - kMaxFootageSeconds, filter.end_s};
 }

@@ -23,7 +23,7 @@ namespace lookhaven::store {
 namespace {
 
 constexpr std::int64_t kIdMask = 0xFFFF'FFFF;
-constexpr int kMaxReadOffset = 1'000;  // what is left out is read only as far as this
+constexpr int kMaxReadOffset = 1'000;  // beyond it PostgreSQL skips rows itself, in one query of all the time
 
 // What is quoted is words and has no other meaning; a phrase holds no quotes.
 std::string ExpressionOf(const MarkFilter& filter) {
@@ -39,12 +39,6 @@ std::string ExpressionOf(const MarkFilter& filter) {
         expression += " AND words : \"" + phrase.typed + '"';
     }
     return expression;
-}
-
-std::string OrderOf(const MarkFilter& filter, const std::string& first, const std::string& second) {
-    const std::string direction = filter.newest_first ? " desc" : "";
-    return " order by " + first + direction + (second.empty() ? "" : ", " + second + direction) +
-           " limit :limit offset :offset";
 }
 
 // Seconds as an index of SQLite has them.
@@ -64,7 +58,8 @@ std::vector<Mark> OnSqlite(soci::session& sql, const MarkFilter& filter, std::in
                               " from mark_words cross join marks on marks.id = (mark_words.rowid & :mask)"
                               " where mark_words match :expression and mark_words.rowid >= :first"
                               " and mark_words.rowid <= :last and end_s > :begin" +
-                              OrderOf(filter, "mark_words.rowid", ""),
+                              " order by mark_words.rowid" + (filter.newest_first ? " desc" : "") +
+                              " limit :limit offset :offset",
                           kIdMask, expression, first, last, filter.begin_s, filter.limit, filter.offset);
 }
 
@@ -101,8 +96,8 @@ std::vector<Mark> OnPostgresql(soci::session& sql, const MarkFilter& filter, Sta
         " and cast(mark_small(text) like all (string_to_array(mark_small(:patterns), ' ')) as integer)"
         " <> 0 and array[camera_id] && cast(:cameras as integer[])"
         " and camera_id = any (cast(:same_cameras as integer[])) and start_s >= :from"
-        " and start_s < :until and end_s > :begin and :kind in (0, kind)" +
-            OrderOf(filter, "start_s", "id"),
+        " and start_s < :until and end_s > :begin and :kind in (0, kind) order by " +
+            OrderOfStarts(filter.newest_first) + " limit :limit offset :offset",
         words, patterns, cameras, cameras, starts.begin_s, starts.end_s, filter.begin_s, NumberOf(filter.kind), limit,
         offset);
 }

@@ -130,25 +130,12 @@ std::vector<Mark> Marks::List(const MarkFilter& filter) {
     if (!filter.words.IsEmpty()) {
         return FindMarksByWords(connection_, filter);
     }
-    const auto offset = static_cast<std::size_t>(std::max(filter.offset, 0));
-    const auto limit = static_cast<std::size_t>(std::max(filter.limit, 0));
-    std::vector<Mark> marks;
-    connection_.Read([&](soci::session& sql) {
-        for (const StartSpan starts : NearestFirst(connection_, StartsOf(filter), filter.newest_first)) {
-            if (marks.size() >= offset + limit) {
-                break;
-            }
-            ForEachCamera<Mark>(
-                connection_, sql, filter.camera_ids, starts, filter.newest_first,
-                static_cast<std::int64_t>(offset + limit), [&marks](const Mark& mark) { marks.push_back(mark); },
-                " and end_s > :reached and :kind in (0, kind)", filter.begin_s, NumberOf(filter.kind));
-        }
-    });
-    const auto key = [](const Mark& mark) { return std::pair(mark.start_s, mark.id); };
-    filter.newest_first ? std::ranges::sort(marks, std::greater{}, key) : std::ranges::sort(marks, {}, key);
-    marks.resize(std::min(marks.size(), offset + limit));
-    marks.erase(marks.begin(), marks.begin() + static_cast<std::ptrdiff_t>(std::min(marks.size(), offset)));
-    return marks;
+    return ListRows<Mark>(connection_, filter, StartsOf(filter),
+                          [&](soci::session& sql, StartSpan starts, std::int64_t limit, const auto& visit) {
+                              ForEachCamera<Mark>(connection_, sql, filter.camera_ids, starts, filter.newest_first,
+                                                  limit, visit, " and end_s > :reached and :kind in (0, kind)",
+                                                  filter.begin_s, NumberOf(filter.kind));
+                          });
 }
 
 std::optional<Mark> Marks::Next(const Step& step, std::optional<MarkKind> kind) {

@@ -12,6 +12,7 @@
 #include <utility>
 #include <vector>
 
+#include "standalone/base/log.h"
 #include "standalone/store/connection.h"
 
 namespace lookhaven::store {
@@ -21,10 +22,9 @@ namespace {
 using std::chrono::months;
 using std::chrono::year_month;
 
-// Making the index of words takes most of the time of moving marks.
 struct PartitionedTable {
     const char* name;
-    std::int64_t max_moved_rows;
+    std::int64_t max_moved_rows;  // more would hold up others too long; marks move more slowly, with their word index
 };
 constexpr std::array<PartitionedTable, 2> kPartitionedTables = {{{"events", 200'000}, {"marks", 30'000}}};
 constexpr std::int64_t kDayS = 86'400;
@@ -75,12 +75,13 @@ std::vector<Partition> PartitionsOf(soci::session& sql, const std::string& table
 }
 
 bool IsEmpty(soci::session& sql, const std::string& table) {
-    // In the order of an index: the beginning of the table may have been emptied.
+    // By an index: a scan of the table might pass over many deleted rows first.
     return !Exists(sql, "select id from " + table + " order by id desc limit 1");
 }
 
-// The table is locked first, in the order of readers: whoever waited for the default partition alone would then look
-// for rows that were moved in a list of partitions from before.
+// Does nothing but warn where too many rows would be moved. Locks the table before its default partition, as readers
+// do: a reader that waited for the default partition alone would already have the old list of partitions, and miss the
+// rows that were moved.
 void MakePartition(soci::session& sql, const PartitionedTable& partitioned, year_month month) {
     const std::string table = partitioned.name;
     const std::string rest = table + "_default";
@@ -89,6 +90,8 @@ void MakePartition(soci::session& sql, const PartitionedTable& partitioned, year
     const std::string end = std::to_string(StartOf(month + months(1)));
     const std::string rows = " from " + rest + " where start_s >= " + begin + " and start_s < " + end;
     if (Exists(sql, "select 1" + rows + " offset :most limit 1", partitioned.max_moved_rows)) {
+        base::LogWarning("more than " + std::to_string(partitioned.max_moved_rows) + " rows of " + name + " stay in " +
+                         rest);
         return;
     }
     sql << "lock table only " + table;
@@ -109,7 +112,7 @@ void MakePartitionIfNone(soci::session& sql, const PartitionedTable& table, year
     }
 }
 
-// Those that have from kMinEvents on, the newest first, without those after the next one.
+// Those with at least kMinEventsForPartition events, the newest first, without those after the next one.
 std::vector<year_month> MonthsOf(soci::session& sql, const std::map<std::int64_t, std::int64_t>& events_by_day) {
     const std::int64_t end = StartOf(ThisMonth(sql) + months(2)) / kDayS;
     std::map<year_month, std::int64_t, std::greater<>> events_by_month;
@@ -118,14 +121,15 @@ std::vector<year_month> MonthsOf(soci::session& sql, const std::map<std::int64_t
     }
     std::vector<year_month> found;
     for (const auto& [month, events] : events_by_month) {
-        if (events >= kMinEvents) {
+        if (events >= kMinEventsForPartition) {
             found.push_back(month);
         }
     }
     return found;
 }
 
-// Dropping locks the table itself exclusively: before the partition, in the order of readers.
+// Drops the partitions that end by then and are empty. Dropping locks the table itself, too: first, as readers do, so
+// that none waits for the other.
 void DropEmpty(soci::session& sql, const std::string& table, std::int64_t before_s) {
     std::vector<Partition> empty = PartitionsOf(sql, table);
     std::erase_if(
@@ -137,6 +141,22 @@ void DropEmpty(soci::session& sql, const std::string& table, std::int64_t before
             sql << "drop table " + partition.name;
         }
     }
+}
+
+void NoteFirstId(soci::session& sql, year_month month) {
+    // Notes of later months are those of a server's clock that was wrong.
+    Execute(sql, "delete from month_first_ids where start_s > :start", StartOf(month));
+    Execute(sql,
+            "insert into month_first_ids (start_s, first_id) select cast(:start as bigint), value + 1 from counters"
+            " where name = 'event' on conflict (start_s) do nothing",
+            StartOf(month));
+}
+
+// Where two transactions removed the last two events of a pair at the same time, each still saw the other's and left
+// the pair.
+void ForgetPairsWithoutEvents(soci::session& sql) {
+    Execute(sql, "select forget_event_camera(camera_id, mount_id) from event_cameras as pair where not exists"
+                 " (select from events where camera_id = pair.camera_id and mount_id = pair.mount_id)");
 }
 
 }  // namespace
@@ -154,16 +174,16 @@ void MakePartitionsFor(soci::session& sql, const std::map<std::int64_t, std::int
     }
 }
 
-void MaintainPartitions(Store& store) {
+void MaintainPartitions(Store& store, const std::stop_token& stop) {
     Connection& connection = store.connection();
     if (connection.IsSqlite()) {
         return;
     }
     const auto change = [&connection](auto&& work) {
         return connection.Write([&](soci::session& sql) {
-            LockSchema(connection, sql);  // nobody waits behind whoever waits for this lock
+            LockSchema(connection, sql);  // first: whoever waits for it holds no lock that others need
             sql << "set local lock_timeout = '1500ms'";
-            sql << "set local statement_timeout = '60s'";  // a slow disk would fail again each time
+            sql << "set local statement_timeout = '60s'";  // the usual five seconds would fail on a slow disk each time
             return work(sql);
         });
     };
@@ -179,30 +199,25 @@ void MaintainPartitions(Store& store) {
     };
     const auto make = [&](year_month month) {
         for (const PartitionedTable& table : kPartitionedTables) {
-            attempt([&](soci::session& sql) { MakePartitionIfNone(sql, table, month); });
+            if (!stop.stop_requested()) {
+                attempt([&](soci::session& sql) { MakePartitionIfNone(sql, table, month); });
+            }
         }
     };
     const year_month now = change([](soci::session& sql) {
         const year_month month = ThisMonth(sql);
-        Execute(sql, "delete from event_months where start_s > :start", StartOf(month));  // of a clock that was wrong
-        Execute(sql,
-                "insert into event_months (start_s, first_id) select cast(:start as bigint), value + 1 from counters"
-                " where name = 'event' on conflict (start_s) do nothing",
-                StartOf(month));
+        NoteFirstId(sql, month);
         return month;
     });
     make(now);
     make(now + months(1));
-    // Two transactions that each removed an event while the other's was still visible have both left its pair.
-    attempt([](soci::session& sql) {
-        Execute(sql, "select forget_event_camera(camera_id, mount_id) from event_cameras as pair where not exists"
-                     " (select from events where camera_id = pair.camera_id and mount_id = pair.mount_id)");
-    });
+    attempt(ForgetPairsWithoutEvents);
     for (const PartitionedTable& table : kPartitionedTables) {
         attempt([&](soci::session& sql) { DropEmpty(sql, table.name, StartOf(now)); });
     }
-    std::ranges::for_each(
-        connection.Read([](soci::session& sql) { return MonthsOf(sql, EventsByDay(sql, "events_default")); }), make);
+    const std::vector<year_month> months_to_move =
+        connection.Read([](soci::session& sql) { return MonthsOf(sql, EventsByDay(sql, "events_default")); });
+    std::ranges::for_each(months_to_move, make);
     if (failure) {
         std::rethrow_exception(failure);
     }

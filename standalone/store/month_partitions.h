@@ -10,6 +10,7 @@
 
 #include <cstdint>
 #include <map>
+#include <stop_token>
 
 #include "standalone/store/store.h"
 
@@ -19,22 +20,27 @@ class session;
 
 namespace lookhaven::store {
 
-// Makes the partitions of this month and the next by the server's clock, and those of earlier months that have from
-// kMinEvents events on in the default partition; what that has of a month is moved. Leaves a month that has so many
-// rows there that moving them would hold up others for long. Drops partitions of past months that are empty. Nothing to
-// do for SQLite.
+// The number of events in the default partition for which a month gets its own: a few of a wrong clock, or of a month
+// long ago, are not worth one.
+constexpr std::int64_t kMinEventsForPartition = 1'000;
+
+// Makes the partitions of this month and the next by the server's clock, and those of earlier months with at least
+// kMinEventsForPartition events in the default partition, whose rows of that month are moved. A month with so many rows
+// there that moving them would hold up others for long is left there, with a warning. Drops partitions of past months
+// that are empty. Nothing to do for SQLite.
 //
 // Any number of programs may call it at once: they take turns. It waits at most 1.5 s for a table's lock, since what
-// comes after it queues up behind; others then wait for the one or two seconds in which rows are moved. Throws
-// StoreError, also when a lock is not to be had, after it has done what it can of the rest.
-void MaintainPartitions(Store& store);
-constexpr std::int64_t kMinEvents = 1'000;  // a few of a wrong clock, or of a month long ago, are not worth a partition
+// comes after it queues up behind, and a minute for a statement; others wait for the one or two seconds in which rows
+// are moved. Throws StoreUnavailable at once, any other StoreError, such as for a lock not obtained, after the rest.
+// After stop is requested it ends before the next month.
+void MaintainPartitions(Store& store, const std::stop_token& stop = {});
 
-// How many events start on each day, by its number since 1970-01-01.
+// How many events of the table ("events", or one of its partitions) start on each day, which is given in days since
+// 1970-01-01 UTC.
 std::map<std::int64_t, std::int64_t> EventsByDay(soci::session& sql, const char* table);
 
-// For a store of PostgreSQL that is about to be filled with those: the partitions of months that have from kMinEvents
-// on, but of none after the next month. Inside Write, after LockSchema, only.
+// PostgreSQL only, before these events are inserted: makes the partitions of months with at least
+// kMinEventsForPartition of them, but none after the next month. Only inside Write, after LockSchema.
 void MakePartitionsFor(soci::session& sql, const std::map<std::int64_t, std::int64_t>& events_by_day);
 
 }  // namespace lookhaven::store

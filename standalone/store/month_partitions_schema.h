@@ -6,50 +6,51 @@
 
 namespace lookhaven::store {
 
-// What there is becomes one partition, "…_earlier", up to the next month; what is dated later goes to the default
+// The existing table becomes one partition, "…_earlier", up to the next month; what is dated later goes to the default
 // one, "…_default", which has what no other takes. An empty table becomes no partition. Nothing else is copied: each
 // index is declared again as it was, since PostgreSQL attaches an equal one of the old table instead of building it;
 // they are renamed to free their names. Only the primary key's is built.
 //
-// The key of a partitioned table must hold the column that it is partitioned by, so PostgreSQL does not see to it any
-// more that an id is given once: the counter does, and Events::Begin. Nothing can refer to an event by its id, so a
-// trigger removes the note of a kept one.
+// The key of a partitioned table must hold the column that it is partitioned by, so PostgreSQL no longer enforces that
+// ids are unique: the counter does, and Events::Begin. A foreign key cannot refer to an event by its id alone, so a
+// trigger removes the row of kept_events.
 //
-// event_cameras   the pairs of camera and mount that have events, so that no search looks for them in each month.
-//                 Adding an event locks its pair's row in share mode, forgetting a pair locks it exclusively: so none
-//                 goes while an event is being added. The triggers do not run for what moves between partitions.
-// event_months    the next id when a month was first seen: a hint where to look for one
+// event_cameras     the pairs of camera and mount that have events, so that no search looks for them in each month.
+//                   Adding an event locks its pair's row in share mode, forgetting a pair locks it exclusively: so no
+//                   pair is removed while an event of it is added. The triggers run for statements that name "events",
+//                   not for what moves between partitions: never remove events from a partition directly.
+// month_first_ids   the first id of each month, whether given to an event or a mark: FindById looks there first
 inline constexpr const char* kMonthPartitionsOnPostgresql[] = {
-    "create table event_months (start_s bigint not null primary key, first_id integer not null)",
+    "create table month_first_ids (start_s bigint not null primary key, first_id integer not null)",
     ("create table event_cameras (camera_id integer not null, mount_id integer not null,"
      " primary key (mount_id, camera_id))"),
     "alter table kept_events drop constraint kept_events_event_id_fkey",
     R"(do $do$
 declare
-    divided text;
+    parent text;
     own_index text;
     following bigint := extract(epoch from date_trunc('month', now() at time zone 'UTC') + interval '1 month');
     has_rows boolean;
 begin
-    foreach divided in array array['events', 'marks'] loop
-        execute format('alter table %I rename to %I', divided, divided || '_earlier');
-        execute format('alter table %I drop constraint %I', divided || '_earlier', divided || '_pkey');
+    foreach parent in array array['events', 'marks'] loop
+        execute format('alter table %I rename to %I', parent, parent || '_earlier');
+        execute format('alter table %I drop constraint %I', parent || '_earlier', parent || '_pkey');
         for own_index in select indexname from pg_indexes
-            where schemaname = current_schema() and tablename = divided || '_earlier' loop
+            where schemaname = current_schema() and tablename = parent || '_earlier' loop
             execute format('alter index %I rename to %I', own_index, own_index || '_earlier');
         end loop;
-        execute format('create table %I (like %I including defaults) partition by range (start_s)', divided,
-                       divided || '_earlier');
-        execute format('create table %I partition of %I default', divided || '_default', divided);
-        execute format('select exists (select from %I)', divided || '_earlier') into has_rows;
+        execute format('create table %I (like %I including defaults) partition by range (start_s)', parent,
+                       parent || '_earlier');
+        execute format('create table %I partition of %I default', parent || '_default', parent);
+        execute format('select exists (select from %I)', parent || '_earlier') into has_rows;
         if has_rows then
-            execute format('insert into %I select * from %I where start_s >= $1', divided, divided || '_earlier')
+            execute format('insert into %I select * from %I where start_s >= $1', parent, parent || '_earlier')
                 using following;
-            execute format('delete from %I where start_s >= $1', divided || '_earlier') using following;
-            execute format('alter table %I attach partition %I for values from (minvalue) to (%s)', divided,
-                           divided || '_earlier', following);
+            execute format('delete from %I where start_s >= $1', parent || '_earlier') using following;
+            execute format('alter table %I attach partition %I for values from (minvalue) to (%s)', parent,
+                           parent || '_earlier', following);
         else
-            execute format('drop table %I', divided || '_earlier');
+            execute format('drop table %I', parent || '_earlier');
         end if;
     end loop;
 end $do$)",
@@ -83,6 +84,7 @@ begin
         loop
             perform 1 from event_cameras where camera_id = pair.camera_id and mount_id = pair.mount_id for key share;
             exit when found;
+            -- Again where another transaction adds or removes the pair between the two.
             insert into event_cameras (camera_id, mount_id) values (pair.camera_id, pair.mount_id)
                 on conflict do nothing;
             exit when found;

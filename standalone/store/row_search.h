@@ -7,10 +7,14 @@
 //               most likely lies first, and the others only where it has to.
 #pragma once
 
+#include <algorithm>
+#include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "standalone/store/connection.h"
@@ -27,12 +31,13 @@ struct StartSpan {
     friend bool operator==(const StartSpan&, const StartSpan&) = default;
 };
 
-// Splits a search in the order of starts: read the next span only while rows are missing. On PostgreSQL the 31 days in
-// which the order begins, half a year, and the rest; on SQLite one span. Disjoint, and together all of it.
+// Splits a search into disjoint spans that cover it, the nearest first: read the next one only while rows are missing.
+// On PostgreSQL up to 31 days from where the order begins (from now, if that is nearer), up to 186 days, and the rest.
+// One span on SQLite, and for the oldest first from 0 on.
 std::vector<StartSpan> NearestFirst(const Connection& connection, StartSpan all, bool newest_first);
 
 // Where what has that id probably starts. On PostgreSQL only.
-StartSpan ProbableSpan(soci::session& sql, int id);
+StartSpan ProbableStarts(soci::session& sql, int id);
 
 // The event or mark of that id that meets the condition ("and …", or ""). Looks where the id was probably given out
 // first, then everywhere.
@@ -41,7 +46,7 @@ std::optional<Row> FindById(Connection& connection, int id, const std::string& c
                             const Parameter&... parameters) {
     return connection.Read([&](soci::session& sql) {
         if (!connection.IsSqlite()) {
-            const StartSpan span = ProbableSpan(sql, id);
+            const StartSpan span = ProbableStarts(sql, id);
             const std::string text = "where id = :id and start_s >= :begin and start_s < :end " + condition;
             if (auto found = FetchOne<Row>(sql, text, id, span.begin_s, span.end_s, parameters...)) {
                 return found;
@@ -89,13 +94,38 @@ void ForEachCamera(Connection& connection, soci::session& sql, const std::set<in
     }
 }
 
-// The starts among which the step's next event or mark lies.
-StartSpan SpanOf(const Step& step);
+// The filter's rows without the first filter.offset, at most filter.limit, by start and id. They start in the span; for
+// a part of it read(sql, starts, limit, visit) visits at most limit rows of each camera in the order of OrderOfStarts.
+template <typename Row, typename Filter, typename ReadPart>
+std::vector<Row> ListRows(Connection& connection, const Filter& filter, StartSpan all, const ReadPart& read) {
+    const auto offset = static_cast<std::size_t>(std::max(filter.offset, 0));
+    const std::size_t wanted = offset + static_cast<std::size_t>(std::max(filter.limit, 0));
+    std::vector<Row> rows;
+    connection.Read([&](soci::session& sql) {
+        for (const StartSpan starts : NearestFirst(connection, all, filter.newest_first)) {
+            if (rows.size() >= wanted) {
+                break;
+            }
+            read(sql, starts, static_cast<std::int64_t>(wanted), [&rows](const Row& row) { rows.push_back(row); });
+        }
+    });
+    const auto key = [](const Row& row) { return std::pair(row.start_s, row.id); };
+    if (filter.camera_ids.size() > 1) {
+        filter.newest_first ? std::ranges::sort(rows, std::greater{}, key) : std::ranges::sort(rows, {}, key);
+    }
+    rows.resize(std::min(rows.size(), wanted));
+    rows.erase(rows.begin(), rows.begin() + static_cast<std::ptrdiff_t>(std::min(rows.size(), offset)));
+    return rows;
+}
 
-// What meets the condition (" and …") and comes first behind the step's place, or last before it.
+// The starts among which the step's next event or mark lies.
+StartSpan StartsOf(const Step& step);
+
+// The nearest row behind the step's place, or before it for one backwards, that meets the condition (" and …").
 template <typename Row, typename... Parameter>
 std::optional<Row> NextRow(Connection& connection, const Step& step, const std::string& condition,
                            const Parameter&... parameters) {
+    // Starts are bound by StartsOf, so this leaves out only rows of the step's own second that are not past its id.
     const std::string behind =
         step.backwards ? " and (start_s < :start or id < :id)" : " and (start_s > :start or id > :id)";
     std::optional<Row> next;
@@ -105,7 +135,7 @@ std::optional<Row> NextRow(Connection& connection, const Step& step, const std::
         }
     };
     connection.Read([&](soci::session& sql) {
-        for (const StartSpan starts : NearestFirst(connection, SpanOf(step), step.backwards)) {
+        for (const StartSpan starts : NearestFirst(connection, StartsOf(step), step.backwards)) {
             if (next) {
                 break;
             }

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The steps that lead from an empty store to this program's schema, the same for both engines but for what they have of
-// their own to search texts.
+// The steps that lead from an empty store to this program's schema, the same for both engines except for
+// searching texts, and for PostgreSQL's partitions.
 //
 // Invariants    (1) A step that was ever released is never changed; a new need is a new step at the end.
 //               (2) Columns are never null, so that no reader has to check.
@@ -18,8 +18,8 @@ struct Migration {
     // What follows on one engine alone: nothing in it holds a record that is nowhere else.
     std::span<const char* const> on_sqlite = {};
     std::span<const char* const> on_postgresql = {};
-    // It adds tables, or columns with a default, or changes indexes, keys or partitions in a way that programs which do
-    // not know it need not know: they go on using the store.
+    // It adds tables, or columns with a default, or changes indexes, keys or partitions, such that older programs can go
+    // on using the store.
     bool is_addition = false;
 };
 

@@ -75,7 +75,13 @@ int ReadVersionOfIdle(Connection& connection) {
         return ReadVersionOfReady(connection);
     }
     const char* query = "select version from schema_version where current_setting('transaction_read_only') = 'off'";
-    return connection.Read([&](soci::session& sql) { return std::stoi(AskWithin(sql, query, kAnswerLimit).value()); });
+    return connection.Read([&](soci::session& sql) {
+        const std::optional<std::string> version = AskWithin(sql, query, kAnswerLimit);
+        if (!version) {
+            throw StoreUnavailable("the database server does not answer, or takes no changes");
+        }
+        return std::stoi(*version);
+    });
 }
 
 void CheckVersion(Connection& connection, int version) {

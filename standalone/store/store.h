@@ -3,8 +3,8 @@
 // One connection to the record store: accounts, cameras, recorded events, e-maps and all else that is kept as records.
 //
 // Why so        A request process opens the store, asks a few questions and closes it, so opening is cheap and does no
-//               more than check that the schema is the one this program knows. SQLite and PostgreSQL take the same
-//               statements; connection.cpp and store.cpp hold the differences.
+//               more than check that the schema is the one this program knows. Most statements are the same for SQLite
+//               and PostgreSQL; they differ in the steps of the schema, and where IsSqlite() is asked.
 // Thread safety One Store per thread. Any number of processes. A Store must not be used across fork().
 // Failures      Besides what its declaration names, every function of a record class throws StoreError. Whatever it
 //               throws, a change is made whole or not at all, unless its declaration says otherwise. Times are UTC

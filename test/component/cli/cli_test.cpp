@@ -134,11 +134,11 @@ TEST_F(DemoTest, AStoreOfAnotherVersionIsLeftAsItIsByAllButInit) {
     }
     Sql({"update schema_version set version = " + version,
          "update settings set value = '" + version + "' where name = 'schema_compatible'"});
-    UndoLastMigration();
+    UndoLastMigrations();
     for (const char* line : {"camera list", "user remove viewer", "verify --repair"}) {
         Play({{line, 78, "run lookhaven init"}});
     }
-    Play({{"init --json", 0, "\"migrations\" : 1"}, {"user list", 0, "viewer"}, {"camera list", 0, "Entrance"}});
+    Play({{"init --json", 0, "\"migrations\" : 2"}, {"user list", 0, "viewer"}, {"camera list", 0, "Entrance"}});
 }
 
 TEST_F(CliTest, LogLevelsAreSetPerCategoryAndProcess) {

@@ -130,8 +130,11 @@ void CliTest::Sql(const std::vector<std::string>& statements) {
     });
 }
 
-void CliTest::UndoLastMigration() {
-    Sql({"update schema_version set version = version - 1"});  // the last step changes PostgreSQL alone
+void CliTest::UndoLastMigrations() {
+    // The last step changes PostgreSQL alone, so the one before it, too.
+    Sql({"drop table event_id_blocks", "drop table mount_leases", "drop table shared_mount_hosts",
+         "alter table events_pending_deletion drop column host_id", "alter table events drop column host_id",
+         "update schema_version set version = version - 2"});
 }
 
 void CliTest::SetUpDemo() {

@@ -47,7 +47,7 @@ class CliTest : public testing::Test {
     // Runs the statements in the store, whatever version it has.
     void Sql(const std::vector<std::string>& statements);
     // Makes the store that of the version before the last step in store/schema.cpp.
-    void UndoLastMigration();
+    void UndoLastMigrations();
 
     test::TemporaryFolder folder_;
     const std::filesystem::path home_ = folder_ / "home";

@@ -47,7 +47,7 @@ TEST_F(DoctorTest, FaultsOfFolderAndStoreAreFoundAndMendedWithoutLoss) {
              Sql("update schema_version set version = " + std::to_string(store::Store::SchemaVersion()))();
              Sql("update settings set value = '1' where name = 'schema_compatible'")();
          }},
-        {"older store", [&] { UndoLastMigration(); }, "do: lookhaven init"},
+        {"older store", [&] { UndoLastMigrations(); }, "do: lookhaven init"},
         {"no account yet", Sql("delete from users"), "do: lookhaven setup-address\n",
          [&] {
              const std::string said = Run("setup-address").text;

@@ -111,7 +111,7 @@ TEST_P(MonthPartitionsTest, AreMadeForWhatIsRecordedAndDroppedOnceTheyAreEmpty) 
     Events events(store);
     EXPECT_EQ(Partitions(), "events_default marks_default") << "recording need not wait for the others";
     const std::int64_t now_s = base::WallSeconds();
-    events.AddAll(std::vector(kMinEvents, EventAt(kOld)));
+    events.AddAll(std::vector(kMinEventsForPartition, EventAt(kOld)));
     const int last = events.NextIds(3) + 2;
     events.AddAll(std::vector{EventAt(now_s), EventAt(kFuture), EventAt(kOld - 86'400)});
     KeptEvents(store).Keep(std::vector{1}, {"note", "", 0});
@@ -157,7 +157,7 @@ TEST_P(MonthPartitionsTest, AMonthWithTooMuchToMoveOrAFaultKeepsNoOtherFromBeing
     Store::Migrate(url_);
     Store store = Store::Open(url_);
     for (const std::int64_t start_s : {kOld, kOld + 40 * 86'400, kOld + 70 * 86'400}) {
-        Events(store).AddAll(std::vector(kMinEvents, EventAt(start_s)));
+        Events(store).AddAll(std::vector(kMinEventsForPartition, EventAt(start_s)));
     }
     Force("insert into marks select n, 1, 5, 0, " + std::to_string(kOld) +
           ", 0, '', 2, 0, '', 0 from generate_series(1, 30001) as n");
@@ -165,8 +165,8 @@ TEST_P(MonthPartitionsTest, AMonthWithTooMuchToMoveOrAFaultKeepsNoOtherFromBeing
     EXPECT_THROW(MaintainPartitions(store), StoreError);
     EXPECT_EQ(PartitionOf("events", 1), "events_2020_01");
     EXPECT_EQ(PartitionOf("marks", 1), "marks_default");
-    EXPECT_EQ(PartitionOf("events", kMinEvents + 1), "events_2020_02");
-    EXPECT_EQ(PartitionOf("events", 2 * kMinEvents + 1), "events_default");
+    EXPECT_EQ(PartitionOf("events", kMinEventsForPartition + 1), "events_2020_02");
+    EXPECT_EQ(PartitionOf("events", 2 * kMinEventsForPartition + 1), "events_default");
 }
 
 TEST_P(MonthPartitionsTest, ManyEventsOfACameraAreRemovedAtOnce) {
@@ -188,11 +188,11 @@ TEST_P(MonthPartitionsTest, AnIdIsLookedForWhereItWasGivenOutAndThenEverywhere) 
     Store::Migrate(url_);
     Store store = Store::Open(url_);
     const auto span_of = [&store](int id) {
-        return store.connection().Read([id](soci::session& sql) { return ProbableSpan(sql, id); });
+        return store.connection().Read([id](soci::session& sql) { return ProbableStarts(sql, id); });
     };
     constexpr auto kNoEnd = std::numeric_limits<std::int64_t>::max();
     EXPECT_EQ(span_of(3), (StartSpan{0, kNoEnd}));
-    Force("insert into event_months values (" + std::to_string(kOld) + ", 3), (" + std::to_string(kFuture) + ", 6)");
+    Force("insert into month_first_ids values (" + std::to_string(kOld) + ", 3), (" + std::to_string(kFuture) + ", 6)");
     EXPECT_EQ(span_of(2), (StartSpan{0, kOld + 86'400}));
     EXPECT_EQ(span_of(3), (StartSpan{kOld, kFuture + 86'400}));
     EXPECT_EQ(span_of(6), (StartSpan{kFuture, kNoEnd}));
@@ -266,14 +266,14 @@ TEST_P(MonthPartitionsTest, WhatLiesMonthsApartIsReadInOrder) {
 TEST_P(MonthPartitionsTest, ACopyHasThemFromTheBeginning) {
     Store::Migrate(url_);
     Store store = Store::Open(url_);
-    Events(store).AddAll(std::vector(kMinEvents, EventAt(kOld)));
-    Events(store).AddAll(std::vector(kMinEvents, EventAt(kFuture)));
+    Events(store).AddAll(std::vector(kMinEventsForPartition, EventAt(kOld)));
+    Events(store).AddAll(std::vector(kMinEventsForPartition, EventAt(kFuture)));
     url_ = NewUrl(Engine::kPostgresql, "");
     Store::Migrate(url_);
     Store copy = Store::Open(url_);
     CopyRecords(store, copy, CopySessions::kNo);
     EXPECT_EQ(PartitionOf("events", 1), "events_2020_01");
-    EXPECT_EQ(PartitionOf("events", kMinEvents + 1), "events_default");
+    EXPECT_EQ(PartitionOf("events", kMinEventsForPartition + 1), "events_default");
 }
 
 INSTANTIATE_TEST_SUITE_P(, MonthPartitionsTest, testing::Values(Engine::kPostgresql), EngineName);
