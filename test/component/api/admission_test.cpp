@@ -223,7 +223,7 @@ TEST_F(Admission, AConnectionThatWasOpenedAheadAndIsLostCostsNoRequest) {
     const std::string session = host_.LogIn().secret;
     ASSERT_TRUE(host::Eventually(std::chrono::seconds(20), [&] { return host_.SpareProcesses().size() == 4; }));
     const auto spares = host_.SpareProcesses();
-    std::ranges::for_each(spares, [](pid_t spare) { ::kill(spare, SIGKILL); });  // they have opened the store from before
+    std::ranges::for_each(spares, [](pid_t spare) { ::kill(spare, SIGKILL); });  // theirs is the store from before
     const std::string others = " from pg_stat_activity where datname = current_database() and pid <> pg_backend_pid()";
     const auto count = [&] { return records.connection().FetchOne<int>("select count(*)" + others).value(); };
     ASSERT_TRUE(host::Eventually(std::chrono::seconds(20), [&] { return count() == std::ssize(spares); }));
