@@ -113,6 +113,10 @@ void EventRowQueue::RequestStop() {
 }
 
 void EventRowQueue::Work(store::Store& store) {
+    // First: rows may fail or wait for a lock, and other hosts take the cameras of one whose heartbeat stops.
+    if (!is_stopping_ && HoldLease(store, FirstReservedId().value_or(std::numeric_limits<int>::max()))) {
+        FillReserve(store);
+    }
     store::Events events(store);
     std::vector<store::Event> grown;
     std::vector<int> dirty;  // the others
@@ -136,12 +140,8 @@ void EventRowQueue::Work(store::Store& store) {
     for (const int id : dirty) {
         is_all_stored &= StoreRow(events, id);
     }
-    if (is_stopping_) {
-        if (is_all_stored) {
-            ReleaseLease(store);
-        }
-    } else if (HoldLease(store, FirstReservedId().value_or(std::numeric_limits<int>::max()))) {
-        FillReserve(store);
+    if (is_stopping_ && is_all_stored) {
+        ReleaseLease(store);
     }
     // Made and freed without the lock, for which cameras wait.
     PendingMarks pending = UpdatePendingMarks(store::Marks(store).Pending(), pending_marks_, base::WallSeconds());

@@ -10,7 +10,7 @@ namespace {
 
 constexpr std::int64_t kMinuteUs = 60'000'000;
 constexpr std::int64_t kIntervalUs = 60 * kMinuteUs;
-constexpr std::int64_t kRetryUs = 10 * kMinuteUs;
+constexpr std::int64_t kRetryUs = 10 * kMinuteUs;  // where the store cannot be opened
 
 }  // namespace
 
@@ -18,8 +18,9 @@ PartitionMaintenance::PartitionMaintenance(const std::string& store_url)
     : next_us_(base::MonotonicMicros() + kRetryUs) {
     if (!store_url.starts_with("sqlite:")) {
         const auto work = [this](store::Store& store, const std::stop_token& stop) {
-            store::MaintainPartitions(store, stop);
+            // Also after a failure: each attempt may block others for seconds, and there is a month for it.
             next_us_ = base::MonotonicMicros() + kIntervalUs;
+            store::MaintainPartitions(store, stop);
         };
         thread_.emplace(store_url, "maintain the store's partitions", work, StoreThread::Idle::kCloses);
     }

@@ -18,7 +18,7 @@ class PartitionMaintenance {
     // Begins at once, in a thread of its own. Throws std::system_error when no thread can be started.
     explicit PartitionMaintenance(const std::string& store_url);
 
-    // Call it every second: does what is due; does not wait. After a failure again in ten minutes.
+    // Call it every second: does what is due; does not wait. Where the store cannot be opened, again in ten minutes.
     void Ask();
 
     // As in StoreThread.

@@ -26,6 +26,7 @@ constexpr std::size_t kMaxCodecBytes = 32;
 constexpr int kBlocksOfHost = 4096;
 constexpr int kRowsPerBatch = 10'000;
 constexpr int kMovedRowsPerBatch = 1'000;
+constexpr std::size_t kIdsPerStatement = 1'000;  // far less than a statement may take
 
 void RequireSpan(std::int64_t start_s, std::int64_t end_s) {
     if (start_s < 0 || end_s < start_s || end_s - start_s > base::kMaxRecordingSeconds) {
@@ -49,14 +50,18 @@ Event WithOrder(Event event) {
 }
 
 // Runs the text (without " where …") for the rows of those ids that meet the conditions (" and …", or ""); returns how
-// many. On PostgreSQL once, since a trigger runs for each statement.
+// many. On PostgreSQL many at once, since a trigger runs for each statement.
 int ForIds(Connection& connection, soci::session& sql, std::span<const int> ids, const std::string& text,
            const std::string& conditions = "") {
+    int changed = 0;
     if (!connection.IsSqlite()) {
-        return Execute(sql, text + " where id = any (cast(:ids as integer[]))" + conditions, ArrayText(ids));
+        for (; !ids.empty(); ids = ids.subspan(std::min(ids.size(), kIdsPerStatement))) {
+            changed += Execute(sql, text + " where id = any (cast(:ids as integer[]))" + conditions,
+                               ArrayText(ids.first(std::min(ids.size(), kIdsPerStatement))));
+        }
+        return changed;
     }
     int id = 0;
-    int changed = 0;
     soci::statement statement = Prepare(sql, kRepeatedly, text + " where id = :id" + conditions, id);
     for (const int next : ids) {
         id = next;

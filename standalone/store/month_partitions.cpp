@@ -79,10 +79,10 @@ bool IsEmpty(soci::session& sql, const std::string& table) {
     return !Exists(sql, "select id from " + table + " order by id desc limit 1");
 }
 
-// Does nothing but warn where too many rows would be moved. Locks the table before its default partition, as readers
+// False, with a warning, where too many rows would be moved. Locks the table before its default partition, as readers
 // do: a reader that waited for the default partition alone would already have the old list of partitions, and miss the
 // rows that were moved.
-void MakePartition(soci::session& sql, const PartitionedTable& partitioned, year_month month) {
+bool MakePartition(soci::session& sql, const PartitionedTable& partitioned, year_month month) {
     const std::string table = partitioned.name;
     const std::string rest = table + "_default";
     const std::string name = NameOf(table, month);
@@ -92,24 +92,27 @@ void MakePartition(soci::session& sql, const PartitionedTable& partitioned, year
     if (Exists(sql, "select 1" + rows + " offset :most limit 1", partitioned.max_moved_rows)) {
         base::LogWarning("more than " + std::to_string(partitioned.max_moved_rows) + " rows of " + name + " stay in " +
                          rest);
-        return;
+        return false;
     }
     sql << "lock table only " + table;
     sql << "lock table " + rest;
+    sql << "set local statement_timeout = '5s'";  // others wait now
     sql << "create table " + name + " (like " + table + " including defaults)";
     sql << "insert into " + name + " select *" + rows;
     sql << "delete" + rows;
     sql << "alter table " + table + " attach partition " + name + " for values from (" + begin + ") to (" + end + ")";
+    return true;
 }
 
-void MakePartitionIfNone(soci::session& sql, const PartitionedTable& table, year_month month) {
+// Whether there is one now.
+bool MakePartitionIfNone(soci::session& sql, const PartitionedTable& table, year_month month) {
     const std::int64_t start_s = StartOf(month);
     const std::vector<Partition> partitions = PartitionsOf(sql, table.name);
-    if (std::ranges::none_of(partitions, [start_s](const Partition& partition) {
-            return partition.begin_s <= start_s && start_s < partition.end_s;
-        })) {
-        MakePartition(sql, table, month);
-    }
+    return std::ranges::any_of(partitions,
+                               [start_s](const Partition& partition) {
+                                   return partition.begin_s <= start_s && start_s < partition.end_s;
+                               }) ||
+           MakePartition(sql, table, month);
 }
 
 // Those with at least kMinEventsForPartition events, the newest first, without those after the next one.
@@ -156,7 +159,8 @@ void NoteFirstId(soci::session& sql, year_month month) {
 // the pair.
 void ForgetPairsWithoutEvents(soci::session& sql) {
     Execute(sql, "select forget_event_camera(camera_id, mount_id) from event_cameras as pair where not exists"
-                 " (select from events where camera_id = pair.camera_id and mount_id = pair.mount_id)");
+                 " (select from events where camera_id = pair.camera_id and mount_id = pair.mount_id)"
+                 " order by mount_id, camera_id");
 }
 
 }  // namespace
@@ -190,7 +194,9 @@ void MaintainPartitions(Store& store, const std::stop_token& stop) {
     std::exception_ptr failure;
     const auto attempt = [&](auto&& work) {
         try {
-            change(work);
+            if (!stop.stop_requested()) {
+                change(work);
+            }
         } catch (const StoreUnavailable&) {
             throw;
         } catch (const StoreError&) {
@@ -199,8 +205,10 @@ void MaintainPartitions(Store& store, const std::stop_token& stop) {
     };
     const auto make = [&](year_month month) {
         for (const PartitionedTable& table : kPartitionedTables) {
-            if (!stop.stop_requested()) {
-                attempt([&](soci::session& sql) { MakePartitionIfNone(sql, table, month); });
+            bool is_there = false;
+            attempt([&](soci::session& sql) { is_there = MakePartitionIfNone(sql, table, month); });
+            if (!is_there) {
+                break;  // without events, an empty partition of marks would be dropped and made again each time
             }
         }
     };
@@ -209,15 +217,21 @@ void MaintainPartitions(Store& store, const std::stop_token& stop) {
         NoteFirstId(sql, month);
         return month;
     });
-    make(now);
-    make(now + months(1));
+    for (const year_month month : {now, now + months(1)}) {
+        make(month);
+        // Most likely somebody holds a lock for long, and others would queue up again behind the rest.
+        if (failure) {
+            std::rethrow_exception(failure);
+        }
+    }
     attempt(ForgetPairsWithoutEvents);
     for (const PartitionedTable& table : kPartitionedTables) {
         attempt([&](soci::session& sql) { DropEmpty(sql, table.name, StartOf(now)); });
     }
-    const std::vector<year_month> months_to_move =
-        connection.Read([](soci::session& sql) { return MonthsOf(sql, EventsByDay(sql, "events_default")); });
-    std::ranges::for_each(months_to_move, make);
+    std::vector<year_month> past_months;
+    attempt([&](soci::session& sql) { past_months = MonthsOf(sql, EventsByDay(sql, "events_default")); });
+    std::erase_if(past_months, [now](year_month month) { return month >= now; });
+    std::ranges::for_each(past_months, make);
     if (failure) {
         std::rethrow_exception(failure);
     }

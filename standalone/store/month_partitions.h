@@ -30,9 +30,9 @@ constexpr std::int64_t kMinEventsForPartition = 1'000;
 // that are empty. Nothing to do for SQLite.
 //
 // Any number of programs may call it at once: they take turns. It waits at most 1.5 s for a table's lock, since what
-// comes after it queues up behind, and a minute for a statement; others wait for the one or two seconds in which rows
-// are moved. Throws StoreUnavailable at once, any other StoreError, such as for a lock not obtained, after the rest.
-// After stop is requested it ends before the next month.
+// comes after it queues up behind; others wait for the one or two seconds in which rows are moved, 15 at most. Throws
+// StoreUnavailable at once, and so any other StoreError, such as for a lock not obtained, where it concerns this month
+// or the next; of an earlier month after the rest. Ends soon after stop is requested.
 void MaintainPartitions(Store& store, const std::stop_token& stop = {});
 
 // How many events of the table ("events", or one of its partitions) start on each day, which is given in days since

@@ -24,6 +24,8 @@ inline constexpr const char* kMonthPartitionsOnPostgresql[] = {
     "create table month_first_ids (start_s bigint not null primary key, first_id integer not null)",
     ("create table event_cameras (camera_id integer not null, mount_id integer not null,"
      " primary key (mount_id, camera_id))"),
+    // In the order of deletions, which go on to kept_events: otherwise each might wait for the other.
+    "lock table events, marks, kept_events",
     "alter table kept_events drop constraint kept_events_event_id_fkey",
     R"(do $do$
 declare

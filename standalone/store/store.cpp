@@ -28,6 +28,8 @@ constexpr int kLogAttempts = 100;
 constexpr std::chrono::milliseconds kLogAttemptPause{50};
 constexpr std::chrono::minutes kAheadMaxAge{15};
 constexpr std::chrono::seconds kAnswerLimit{2};
+constexpr int kMigrationAttempts = 4;  // each waits for a lock for five seconds; systemd allows 90
+constexpr std::chrono::seconds kMigrationPause{2};
 
 // 0 for a store without a schema.
 int ReadVersion(Connection& connection) {
@@ -239,7 +241,7 @@ int Store::Migrate(const std::string& url) {
     const StoreAddress address = StoreAddress::Parse(url);
     PrepareFile(address);
     Connection connection(address);
-    return connection.Write([&](soci::session& sql) {
+    const auto take_steps = [&](soci::session& sql) {
         if (!connection.IsSqlite()) {
             Execute(sql, "set local statement_timeout = 0");  // a step may rewrite a million rows …
             Execute(sql, "set local lock_timeout = '5s'");    // … but one that waits for a lock blocks all others
@@ -253,7 +255,23 @@ int Store::Migrate(const std::string& url) {
         SetOnce(sql, "installation", RandomHex(kInstallationIdBytes));
         SetOnce(sql, "session_key", RandomHex(Sessions::kKeyDigits / 2));
         return steps;
-    });
+    };
+    // Other hosts go on using PostgreSQL meanwhile, so a lock may not be had in time. Which failure that was, a server
+    // tells in its own language.
+    for (int attempt = 1;; ++attempt) {
+        try {
+            return connection.Write(take_steps);
+        } catch (const StoreUnavailable&) {
+            throw;
+        } catch (const SchemaError&) {
+            throw;
+        } catch (const StoreError&) {
+            if (connection.IsSqlite() || attempt == kMigrationAttempts) {
+                throw;
+            }
+        }
+        std::this_thread::sleep_for(kMigrationPause);
+    }
 }
 
 bool Store::CopyIfOlder(const std::string& url, const std::filesystem::path& folder, Copy when) try {

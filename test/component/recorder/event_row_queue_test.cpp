@@ -10,6 +10,7 @@
 #include "standalone/base/clock.h"
 #include "standalone/base/installation.h"
 #include "standalone/store/connection.h"
+#include "standalone/store/recorder_lease.h"
 #include "test/support/footage/archive_folder.h"
 #include "test/support/wait.h"
 
@@ -24,7 +25,7 @@ class EventRowQueueTest : public testing::Test {
         base::Installation::CreateFolders(home_.Path());
         store::Store::Migrate(url_);
         store_.emplace(store::Store::Open(url_));
-        rows_.emplace(url_);
+        rows_.emplace(url_, "this recorder", 0, LeaseTimes{.renew_us = 100'000});
     }
 
     store::Event Row(std::int64_t start_s, bool recording) {
@@ -68,6 +69,10 @@ TEST_F(EventRowQueueTest, OnlyWhatIsInTheStoreIsSaidToBe) {
     rows_->NoteWritten(1, 2000);
     rows_->Refresh(1);
     EXPECT_FALSE(rows_->HasStored(1, 1001 - kDelayS)) << "the store is unavailable";
+    const auto heartbeat = [this] { return store::RecorderLease(*store_).Current().count; };
+    EXPECT_TRUE(test::Eventually(std::chrono::seconds(30), [&, seen = heartbeat()] {
+        return heartbeat() > seen + 1 || (rows_->Refresh(1), false);
+    })) << "other hosts must not take its cameras";
     Sql("alter table away rename to events");
     EXPECT_TRUE(BecomesStored(1, 2000 - kDelayS));
     EXPECT_TRUE(store::Events(*store_).Find(growing.id)) << "reported as stored before it was";
