@@ -114,7 +114,7 @@ void EventRowQueue::RequestStop() {
 
 void EventRowQueue::Work(store::Store& store) {
     // First: rows may fail or wait for a lock, and other hosts take the cameras of one whose heartbeat stops.
-    if (!is_stopping_ && HoldLease(store, FirstReservedId().value_or(std::numeric_limits<int>::max()))) {
+    if (RenewLease(store)) {
         FillReserve(store);
     }
     store::Events events(store);
@@ -138,6 +138,7 @@ void EventRowQueue::Work(store::Store& store) {
     StoreGrowth(events, grown);
     bool is_all_stored = true;
     for (const int id : dirty) {
+        RenewLease(store);  // there may be many, on a slow disk
         is_all_stored &= StoreRow(events, id);
     }
     if (is_stopping_ && is_all_stored) {
@@ -161,6 +162,11 @@ bool EventRowQueue::HoldLease(store::Store& store, int first_reserved_id) {
         ForgetReserve();
     }
     return is_held;
+}
+
+// Does nothing before it is due, or once a stop is requested. Whether the lease is held and kept.
+bool EventRowQueue::RenewLease(store::Store& store) {
+    return !is_stopping_ && HoldLease(store, FirstReservedId().value_or(std::numeric_limits<int>::max()));
 }
 
 void EventRowQueue::ReleaseLease(store::Store& store) {

@@ -75,6 +75,7 @@ class EventRowQueue {
 
     void Work(store::Store& store);
     bool HoldLease(store::Store& store, int first_reserved_id);
+    bool RenewLease(store::Store& store);
     void ReleaseLease(store::Store& store);
     void ForgetReserve();
     void FillReserve(store::Store& store);

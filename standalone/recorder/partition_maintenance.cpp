@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "standalone/recorder/partition_maintenance.h"
 
+#include <algorithm>
+
 #include "standalone/base/clock.h"
 #include "standalone/store/month_partitions.h"
 
@@ -10,17 +12,22 @@ namespace {
 
 constexpr std::int64_t kMinuteUs = 60'000'000;
 constexpr std::int64_t kIntervalUs = 60 * kMinuteUs;
+constexpr std::int64_t kMaxIntervalUs = 24 * kIntervalUs;
 constexpr std::int64_t kRetryUs = 10 * kMinuteUs;  // where the store cannot be opened
 
 }  // namespace
 
 PartitionMaintenance::PartitionMaintenance(const std::string& store_url)
-    : next_us_(base::MonotonicMicros() + kRetryUs) {
+    : next_us_(base::MonotonicMicros() + kRetryUs),
+      interval_us_(kIntervalUs) {
     if (!store_url.starts_with("sqlite:")) {
         const auto work = [this](store::Store& store, const std::stop_token& stop) {
-            // Also after a failure: each attempt may block others for seconds, and there is a month for it.
-            next_us_ = base::MonotonicMicros() + kIntervalUs;
+            // After a failure less and less often: each attempt may block others for seconds, and has a month.
+            next_us_ = base::MonotonicMicros() + interval_us_;
+            interval_us_ = std::min(2 * interval_us_, kMaxIntervalUs);
             store::MaintainPartitions(store, stop);
+            interval_us_ = kIntervalUs;
+            next_us_ = base::MonotonicMicros() + kIntervalUs;
         };
         thread_.emplace(store_url, "maintain the store's partitions", work, StoreThread::Idle::kCloses);
     }

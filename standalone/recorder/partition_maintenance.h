@@ -18,7 +18,8 @@ class PartitionMaintenance {
     // Begins at once, in a thread of its own. Throws std::system_error when no thread can be started.
     explicit PartitionMaintenance(const std::string& store_url);
 
-    // Call it every second: does what is due; does not wait. Where the store cannot be opened, again in ten minutes.
+    // Call it every second: does what is due; does not wait. Where the store cannot be opened, again in ten minutes;
+    // after any other failure within a day.
     void Ask();
 
     // As in StoreThread.
@@ -27,7 +28,8 @@ class PartitionMaintenance {
 
   private:
     std::atomic<std::int64_t> next_us_;  // CLOCK_MONOTONIC
-    std::optional<StoreThread> thread_;  // none for SQLite; last: it uses the other
+    std::int64_t interval_us_;           // until the next attempt; only the thread uses it
+    std::optional<StoreThread> thread_;  // none for SQLite; last: it uses the others
 };
 
 }  // namespace lookhaven::recorder

@@ -74,8 +74,8 @@ class Connection {
     }
 
     // Calls ask(session), to which the store stays as it is at one moment while others go on changing it. On PostgreSQL
-    // put no condition on start_s: of rows that were moved to a new partition meanwhile, such a session sees those that
-    // are in the default partition, which the condition may leave out. Not inside another, nor inside Write.
+    // put no condition on start_s: to such a session, rows that were moved to a new partition meanwhile are still in the
+    // default one, which the planner would leave out. Not inside another, nor inside Write.
     template <typename Ask>
     auto ReadAtOneMoment(Ask&& ask) {
         return Read([&](soci::session& sql) {

@@ -12,7 +12,6 @@
 #include <utility>
 #include <vector>
 
-#include "standalone/base/log.h"
 #include "standalone/store/connection.h"
 
 namespace lookhaven::store {
@@ -79,10 +78,10 @@ bool IsEmpty(soci::session& sql, const std::string& table) {
     return !Exists(sql, "select id from " + table + " order by id desc limit 1");
 }
 
-// False, with a warning, where too many rows would be moved. Locks the table before its default partition, as readers
-// do: a reader that waited for the default partition alone would already have the old list of partitions, and miss the
+// Throws StoreError where too many rows would be moved. Locks the table before its default partition, as readers do: a
+// reader that waited for the default partition alone would already have the old list of partitions, and miss the
 // rows that were moved.
-bool MakePartition(soci::session& sql, const PartitionedTable& partitioned, year_month month) {
+void MakePartition(soci::session& sql, const PartitionedTable& partitioned, year_month month) {
     const std::string table = partitioned.name;
     const std::string rest = table + "_default";
     const std::string name = NameOf(table, month);
@@ -90,29 +89,25 @@ bool MakePartition(soci::session& sql, const PartitionedTable& partitioned, year
     const std::string end = std::to_string(StartOf(month + months(1)));
     const std::string rows = " from " + rest + " where start_s >= " + begin + " and start_s < " + end;
     if (Exists(sql, "select 1" + rows + " offset :most limit 1", partitioned.max_moved_rows)) {
-        base::LogWarning("more than " + std::to_string(partitioned.max_moved_rows) + " rows of " + name + " stay in " +
+        throw StoreError("more than " + std::to_string(partitioned.max_moved_rows) + " rows of " + name + " stay in " +
                          rest);
-        return false;
     }
     sql << "lock table only " + table;
     sql << "lock table " + rest;
-    sql << "set local statement_timeout = '5s'";  // others wait now
     sql << "create table " + name + " (like " + table + " including defaults)";
     sql << "insert into " + name + " select *" + rows;
     sql << "delete" + rows;
     sql << "alter table " + table + " attach partition " + name + " for values from (" + begin + ") to (" + end + ")";
-    return true;
 }
 
-// Whether there is one now.
-bool MakePartitionIfNone(soci::session& sql, const PartitionedTable& table, year_month month) {
+void MakePartitionIfNone(soci::session& sql, const PartitionedTable& table, year_month month) {
     const std::int64_t start_s = StartOf(month);
     const std::vector<Partition> partitions = PartitionsOf(sql, table.name);
-    return std::ranges::any_of(partitions,
-                               [start_s](const Partition& partition) {
-                                   return partition.begin_s <= start_s && start_s < partition.end_s;
-                               }) ||
-           MakePartition(sql, table, month);
+    if (std::ranges::none_of(partitions, [start_s](const Partition& partition) {
+            return partition.begin_s <= start_s && start_s < partition.end_s;
+        })) {
+        MakePartition(sql, table, month);
+    }
 }
 
 // Those with at least kMinEventsForPartition events, the newest first, without those after the next one.
@@ -185,31 +180,26 @@ void MaintainPartitions(Store& store, const std::stop_token& stop) {
     }
     const auto change = [&connection](auto&& work) {
         return connection.Write([&](soci::session& sql) {
+            // For a turn, and for what only reads much on a slow disk.
+            sql << "set local statement_timeout = '60s'";
             LockSchema(connection, sql);  // first: whoever waits for it holds no lock that others need
             sql << "set local lock_timeout = '1500ms'";
-            sql << "set local statement_timeout = '60s'";  // the usual five seconds would fail on a slow disk each time
             return work(sql);
         });
     };
     std::exception_ptr failure;
     const auto attempt = [&](auto&& work) {
+        if (stop.stop_requested()) {
+            return false;
+        }
         try {
-            if (!stop.stop_requested()) {
-                change(work);
-            }
+            change(work);
+            return true;
         } catch (const StoreUnavailable&) {
             throw;
         } catch (const StoreError&) {
             failure = std::current_exception();
-        }
-    };
-    const auto make = [&](year_month month) {
-        for (const PartitionedTable& table : kPartitionedTables) {
-            bool is_there = false;
-            attempt([&](soci::session& sql) { is_there = MakePartitionIfNone(sql, table, month); });
-            if (!is_there) {
-                break;  // without events, an empty partition of marks would be dropped and made again each time
-            }
+            return false;
         }
     };
     const year_month now = change([](soci::session& sql) {
@@ -217,13 +207,23 @@ void MaintainPartitions(Store& store, const std::stop_token& stop) {
         NoteFirstId(sql, month);
         return month;
     });
-    for (const year_month month : {now, now + months(1)}) {
-        make(month);
-        // Most likely somebody holds a lock for long, and others would queue up again behind the rest.
-        if (failure) {
-            std::rethrow_exception(failure);
+    const auto make = [&](year_month month) {
+        for (const PartitionedTable& table : kPartitionedTables) {
+            const bool is_made = attempt([&](soci::session& sql) {
+                sql << "set local statement_timeout = '5s'";  // others wait for it
+                MakePartitionIfNone(sql, table, month);
+            });
+            if (!is_made && month < now) {
+                break;  // without events, an empty partition of marks would be dropped and made again each time
+            }
         }
+    };
+    make(now + months(1));
+    // There is hardly anything to move, so somebody holds a lock for long: others would queue up behind the rest, too.
+    if (failure) {
+        std::rethrow_exception(failure);
     }
+    make(now);
     attempt(ForgetPairsWithoutEvents);
     for (const PartitionedTable& table : kPartitionedTables) {
         attempt([&](soci::session& sql) { DropEmpty(sql, table.name, StartOf(now)); });

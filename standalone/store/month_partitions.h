@@ -26,13 +26,14 @@ constexpr std::int64_t kMinEventsForPartition = 1'000;
 
 // Makes the partitions of this month and the next by the server's clock, and those of earlier months with at least
 // kMinEventsForPartition events in the default partition, whose rows of that month are moved. A month with so many rows
-// there that moving them would hold up others for long is left there, with a warning. Drops partitions of past months
-// that are empty. Nothing to do for SQLite.
+// there that moving them would hold up others for long is left there. Drops partitions of past months that are empty.
+// Nothing to do for SQLite.
 //
 // Any number of programs may call it at once: they take turns. It waits at most 1.5 s for a table's lock, since what
 // comes after it queues up behind; others wait for the one or two seconds in which rows are moved, 15 at most. Throws
-// StoreUnavailable at once, and so any other StoreError, such as for a lock not obtained, where it concerns this month
-// or the next; of an earlier month after the rest. Ends soon after stop is requested.
+// StoreUnavailable at once. Throws any other StoreError, as for a lock not obtained or a month left, after the rest; at
+// once where it concerns the next month. Begins no further step once stop is requested; the one that runs
+// may take a minute.
 void MaintainPartitions(Store& store, const std::stop_token& stop = {});
 
 // How many events of the table ("events", or one of its partitions) start on each day, which is given in days since

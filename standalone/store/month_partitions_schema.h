@@ -19,7 +19,8 @@ namespace lookhaven::store {
 //                   Adding an event locks its pair's row in share mode, forgetting a pair locks it exclusively: so no
 //                   pair is removed while an event of it is added. The triggers run for statements that name "events",
 //                   not for what moves between partitions: never remove events from a partition directly.
-// month_first_ids   the first id of each month, whether given to an event or a mark: FindById looks there first
+// month_first_ids   the next id, of events and marks alike, when a month was first seen: tells FindById in which months
+//                   to look first
 inline constexpr const char* kMonthPartitionsOnPostgresql[] = {
     "create table month_first_ids (start_s bigint not null primary key, first_id integer not null)",
     ("create table event_cameras (camera_id integer not null, mount_id integer not null,"

@@ -28,7 +28,7 @@ constexpr int kLogAttempts = 100;
 constexpr std::chrono::milliseconds kLogAttemptPause{50};
 constexpr std::chrono::minutes kAheadMaxAge{15};
 constexpr std::chrono::seconds kAnswerLimit{2};
-constexpr int kMigrationAttempts = 4;  // each waits for a lock for five seconds; systemd allows 90
+constexpr int kMigrationAttempts = 4;
 constexpr std::chrono::seconds kMigrationPause{2};
 
 // 0 for a store without a schema.
@@ -256,8 +256,7 @@ int Store::Migrate(const std::string& url) {
         SetOnce(sql, "session_key", RandomHex(Sessions::kKeyDigits / 2));
         return steps;
     };
-    // Other hosts go on using PostgreSQL meanwhile, so a lock may not be had in time. Which failure that was, a server
-    // tells in its own language.
+    // Other hosts go on using PostgreSQL meanwhile, so one of the locks may not be had within its five seconds.
     for (int attempt = 1;; ++attempt) {
         try {
             return connection.Write(take_steps);
