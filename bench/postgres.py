@@ -78,13 +78,13 @@ class Postgres:
         self.ask(database, f"""do $$
 declare
     month timestamp;
-    divided text;
+    parent text;
 begin
     for month in select generate_series(date_trunc('month', to_timestamp({begin_s}) at time zone 'UTC'),
                                         now() at time zone 'UTC', '1 month') loop
-        foreach divided in array array['events', 'marks'] loop
+        foreach parent in array array['events', 'marks'] loop
             execute format('create table %I partition of %I for values from (%s) to (%s)',
-                           divided || to_char(month, '_YYYY_MM'), divided, cast(extract(epoch from month) as bigint),
+                           parent || to_char(month, '_YYYY_MM'), parent, cast(extract(epoch from month) as bigint),
                            cast(extract(epoch from month + interval '1 month') as bigint));
         end loop;
     end loop;

@@ -23,7 +23,7 @@ namespace lookhaven::store {
 namespace {
 
 constexpr std::int64_t kIdMask = 0xFFFF'FFFF;
-constexpr int kMaxReadOffset = 1'000;  // beyond it PostgreSQL skips rows itself, in one query of all the time
+constexpr int kMaxReadOffset = 1'000;  // beyond it PostgreSQL skips the rows, in one query over all spans
 
 // What is quoted is words and has no other meaning; a phrase holds no quotes.
 std::string ExpressionOf(const MarkFilter& filter) {

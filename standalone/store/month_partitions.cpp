@@ -218,12 +218,8 @@ void MaintainPartitions(Store& store, const std::stop_token& stop) {
             }
         }
     };
-    make(now + months(1));
-    // There is hardly anything to move, so somebody holds a lock for long: others would queue up behind the rest, too.
-    if (failure) {
-        std::rethrow_exception(failure);
-    }
     make(now);
+    make(now + months(1));
     attempt(ForgetPairsWithoutEvents);
     for (const PartitionedTable& table : kPartitionedTables) {
         attempt([&](soci::session& sql) { DropEmpty(sql, table.name, StartOf(now)); });

@@ -31,9 +31,8 @@ constexpr std::int64_t kMinEventsForPartition = 1'000;
 //
 // Any number of programs may call it at once: they take turns. It waits at most 1.5 s for a table's lock, since what
 // comes after it queues up behind; others wait for the one or two seconds in which rows are moved, 15 at most. Throws
-// StoreUnavailable at once. Throws any other StoreError, as for a lock not obtained or a month left, after the rest; at
-// once where it concerns the next month. Begins no further step once stop is requested; the one that runs
-// may take a minute.
+// StoreUnavailable at once; any other StoreError, as for a lock not obtained or a month left, after the rest. Begins no
+// further step once stop is requested; the one that runs may take a minute.
 void MaintainPartitions(Store& store, const std::stop_token& stop = {});
 
 // How many events of the table ("events", or one of its partitions) start on each day, which is given in days since
